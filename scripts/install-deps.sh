@@ -1,0 +1,25 @@
+#!/usr/bin/env bash
+# Installs what the build needs beyond the machine's preinstalled tools
+# (g++, clang, cmake, ninja, GoogleTest, Google Benchmark, valgrind).
+# Packages come from Debian; nothing is installed when all are present.
+set -euo pipefail
+
+needed=()
+for tool in cmake ninja g++ clang++; do
+  command -v "$tool" >/dev/null 2>&1 || needed+=("$tool")
+done
+[ -f /usr/include/gtest/gtest.h ] || needed+=(libgtest-dev)
+
+if [ ${#needed[@]} -eq 0 ]; then
+  exit 0
+fi
+
+declare -A package_of=([cmake]=cmake [ninja]=ninja-build [g++]=g++ [clang++]=clang
+                       [libgtest-dev]=libgtest-dev)
+packages=()
+for item in "${needed[@]}"; do packages+=("${package_of[$item]}"); done
+echo "installing: ${packages[*]}"
+sudo_cmd=()
+[ "$(id -u)" -eq 0 ] || sudo_cmd=(sudo)
+"${sudo_cmd[@]}" apt-get update -qq
+DEBIAN_FRONTEND=noninteractive "${sudo_cmd[@]}" apt-get install -y -qq "${packages[@]}"

@@ -1,0 +1,78 @@
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <string>
+
+#include "msg_capture.h"
+#include "pm_spec.h"
+#include "scratch_dir.h"
+
+namespace {
+
+class DeviceTest : public testing::Test {
+  protected:
+    void SetUp() override {
+        const char* old = std::getenv("HX_DEVICE_PATH");
+        had_path_ = old != nullptr;
+        if (had_path_) old_path_ = old;
+        ::unsetenv("HX_DEVICE_PATH");
+    }
+    void TearDown() override {
+        if (had_path_) {
+            ::setenv("HX_DEVICE_PATH", old_path_.c_str(), 1);
+        } else {
+            ::unsetenv("HX_DEVICE_PATH");
+        }
+    }
+    const PM_SPEC spec_{nullptr, PM_BIND_DEVICE};
+    bool had_path_ = false;
+    std::string old_path_;
+};
+
+TEST_F(DeviceTest, SampleDevicesOfTheDeviceFolderAreKnownInAnyCase) {
+    EXPECT_TRUE(spec_.isvalidpmname("qx10", 1));
+    EXPECT_TRUE(spec_.isvalidpmname("QX20", 1));
+    EXPECT_TRUE(spec_.isvalidpmname("Qz400", 1));
+    EXPECT_FALSE(spec_.isvalidpmname("qx11", 1));
+    EXPECT_NE(PM_SPEC::find_device_file("qx10").find("share/vrx/devices/qx10.acd"),
+              std::string::npos);
+}
+
+TEST_F(DeviceTest, NamesThatAreNotPlainFileNamesAreNeverLookedUp) {
+    ScratchDir dir;
+    ScratchDir::write_file(dir.file("evil.acd"), "");
+    ::setenv("HX_DEVICE_PATH", dir.path().c_str(), 1);
+    EXPECT_TRUE(spec_.isvalidpmname("evil", 1));
+    for (const char* name : {"", "../devices/qx10", "sub/qx10", ".qx10", "..", "."}) {
+        EXPECT_FALSE(spec_.isvalidpmname(name, 1)) << name;
+    }
+    EXPECT_FALSE(spec_.isvalidpmname(nullptr, 1));
+}
+
+TEST_F(DeviceTest, DevicePathIsSearchedInOrderAndEmptyEntriesNameNoDirectory) {
+    ScratchDir first, second;
+    ScratchDir::write_file(first.file("qx10.acd"), "first");
+    ScratchDir::write_file(second.file("only2.acd"), "second");
+    const std::string path = "::" + first.path() + ":/nonexistent:" + second.path() + "/";
+    ::setenv("HX_DEVICE_PATH", path.c_str(), 1);
+    EXPECT_EQ(PM_SPEC::find_device_file("qx10"), first.file("qx10.acd"));
+    EXPECT_EQ(PM_SPEC::find_device_file("only2"), second.file("only2.acd"));
+    EXPECT_TRUE(spec_.isvalidpmname("qz400", 1));  // still found in the device folder
+}
+
+TEST_F(DeviceTest, UnknownDeviceIsReportedOnlyWhenAsked) {
+    MsgCapture capture;
+    EXPECT_FALSE(spec_.isvalidpmname("nosuch", 1));
+    EXPECT_TRUE(capture.messages().empty());
+    EXPECT_FALSE(spec_.isvalidpmname("nosuch", 0));
+    EXPECT_EQ(capture.texts(PORT_MSG_WARNING),
+              std::vector<std::string>{"no device description found for 'nosuch'\n"});
+}
+
+TEST(Pic, HoldsTheDeviceName) {
+    const PM_PIC pic("qx20", nullptr, nullptr);
+    EXPECT_STREQ(pic.get_device(), "qx20");
+    EXPECT_STREQ(pic.get_package(), "");
+}
+
+}  // namespace
