@@ -13,12 +13,22 @@ constexpr std::size_t kBufferSize = 1 << 16;
 UT_PTRFILE::UT_PTRFILE(int access) : access_(access), stream_(access, kBufferSize) {}
 
 UT_PTRFILE::~UT_PTRFILE() {
-    if (open_ && access_ == Port::ACCESS_WRITE) stream_.detach();
-    // replace_ removes an unpublished temporary file; stream_ closes a read file.
+    abandon();
+}
+
+void UT_PTRFILE::abandon() {
+    if (!open_) return;
+    open_ = false;
+    if (access_ == Port::ACCESS_WRITE) {
+        stream_.detach();
+        replace_.discard();
+    } else {
+        Port::File::close(&stream_);
+    }
 }
 
 bool UT_PTRFILE::open(const char* name) {
-    if (open_) close();
+    abandon();  // a write in progress is never published by opening another file
     failed_ = false;
     size_ = 0;
     name_ = name ? name : "";

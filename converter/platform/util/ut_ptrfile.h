@@ -4,7 +4,8 @@
 // destination while writing: bytes go to a temporary file beside it, which a
 // clean close renames into place. A close after a failed write, after fail(),
 // or destroying the object while still open removes the temporary file and
-// leaves the destination as it was.
+// leaves the destination as it was, and so does opening another file while a
+// write is in progress.
 #pragma once
 
 #include <cstddef>
@@ -39,6 +40,7 @@ class UT_PTRFILE {
     friend class Port::File;
     bool open(const char* name);
     bool close();
+    void abandon();
 
     int access_;
     bool open_ = false;

@@ -69,10 +69,4 @@ TEST_F(DeviceTest, UnknownDeviceIsReportedOnlyWhenAsked) {
               std::vector<std::string>{"no device description found for 'nosuch'\n"});
 }
 
-TEST(Pic, HoldsTheDeviceName) {
-    const PM_PIC pic("qx20", nullptr, nullptr);
-    EXPECT_STREQ(pic.get_device(), "qx20");
-    EXPECT_STREQ(pic.get_package(), "");
-}
-
 }  // namespace

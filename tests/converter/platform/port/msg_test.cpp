@@ -121,19 +121,4 @@ TEST(Messages, DefaultSinkFormatsEachLevel) {
               "FATAL_ERROR:Quorra - f\n");
 }
 
-TEST(Messages, ReplacingTheSinkReturnsTheFormerOne) {
-    int outer = 0;
-    int inner = 0;
-    const Port_MsgSink before = Port_MsgDispatcher::set_sink(
-        [&](Port_MsgLevel, const Port_MsgLocation&, std::string_view) { ++outer; });
-    Port_MsgSink previous = Port_MsgDispatcher::set_sink(
-        [&](Port_MsgLevel, const Port_MsgLocation&, std::string_view) { ++inner; });
-    PORT_MSG("Quorra", kRev).issueInfo("one");
-    Port_MsgDispatcher::set_sink(std::move(previous));
-    PORT_MSG("Quorra", kRev).issueInfo("two");
-    Port_MsgDispatcher::set_sink(before);
-    EXPECT_EQ(inner, 1);
-    EXPECT_EQ(outer, 1);
-}
-
 }  // namespace

@@ -1,6 +1,5 @@
 #include <gtest/gtest.h>
 
-#include <memory>
 #include <string>
 
 #include "ut_path.h"
@@ -19,13 +18,6 @@ TEST(Str, CompareOrdersAbsentBeforeEveryText) {
     EXPECT_FALSE(UT_STR::ContainsChar(nullptr, 'a'));
     EXPECT_TRUE(UT_STR::ContainsChar("a b", ' '));
     EXPECT_FALSE(UT_STR::ContainsChar("ab", '\0'));
-}
-
-TEST(Str, DupMakesAnIndependentCopy) {
-    char source[] = "name";
-    std::unique_ptr<char[]> copy(UT_STR::Dup(source));
-    source[0] = 'X';
-    EXPECT_STREQ(copy.get(), "name");
 }
 
 TEST(Str, BoundedCompositionTruncatesAndSaysSo) {

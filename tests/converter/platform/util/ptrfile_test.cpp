@@ -63,7 +63,16 @@ TEST(PtrFile, WriterMarkedFailedOrAbandonedPublishesNothing) {
         ASSERT_NE(Port::File::open(dir.file("abandoned.hxb").c_str(), &file, true), nullptr);
         write_text(file, "never closed");
     }
-    EXPECT_TRUE(dir.entries().empty());
+    {
+        UT_PTRFILE file(Port::ACCESS_WRITE);
+        ASSERT_NE(Port::File::open(dir.file("interrupted.hxb").c_str(), &file, true), nullptr);
+        write_text(file, "first half");
+        ASSERT_NE(Port::File::open(dir.file("second.hxb").c_str(), &file, true), nullptr);
+        write_text(file, "complete");
+        EXPECT_TRUE(Port::File::close(&file));
+    }
+    EXPECT_EQ(dir.entries(), std::vector<std::string>{"second.hxb"});
+    EXPECT_EQ(ScratchDir::read_file(dir.file("second.hxb")), "complete");
 }
 
 TEST(PtrFile, OpenForWriteFailsWhereNoFileCanBeMade) {

@@ -45,13 +45,4 @@ TEST_F(TimestampTest, PiecesHaveTheirFixedForms) {
     EXPECT_STREQ(epoch.get_ts_year(), "1970");
 }
 
-TEST_F(TimestampTest, NowIsLocalTime) {
-    const std::time_t before = std::time(nullptr);
-    const UT_TIMESTAMP now;
-    std::tm t{};
-    localtime_r(&before, &t);
-    EXPECT_EQ(std::atoi(now.get_ts_year()), t.tm_year + 1900);
-    EXPECT_EQ(std::string(now.get_ts_hour()).size(), 2u);
-}
-
 }  // namespace
