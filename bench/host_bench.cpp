@@ -33,21 +33,26 @@ std::vector<Sig> make_signals(std::size_t n) {
     return sigs;
 }
 
-// A reader's pattern: each name is created once, then referenced a few more times.
-void BM_NameTreeFindOrCreate(benchmark::State& state) {
-    const auto n = static_cast<std::size_t>(state.range(0));
-    std::vector<Sig> sigs = make_signals(n);
+// Each signal referenced three times, in a fixed random order.
+std::vector<const Sig*> shuffled_references(const std::vector<Sig>& sigs) {
     std::vector<const Sig*> refs;
     for (const Sig& s : sigs)
         refs.insert(refs.end(), 3, &s);
     std::shuffle(refs.begin(), refs.end(), std::mt19937(1));
+    return refs;
+}
+
+// A reader's pattern: each name is created once, then referenced a few more times.
+void BM_NameTreeFindOrCreate(benchmark::State& state) {
+    const std::vector<Sig> sigs = make_signals(static_cast<std::size_t>(state.range(0)));
+    const std::vector<const Sig*> refs = shuffled_references(sigs);
     for (auto _ : state) {
-        UT_BTR_TREE<Sig> tree(compare_sig);
+        UT_BTR_TREE<const Sig> tree(compare_sig);
         std::size_t created = 0;
         for (const Sig* ref : refs) {
-            Sig*& slot = tree.add(ref->name.c_str());
+            const Sig*& slot = tree.add(ref->name.c_str());
             if (slot == nullptr) {
-                slot = const_cast<Sig*>(ref);
+                slot = ref;
                 ++created;
             }
         }
@@ -80,17 +85,10 @@ void BM_StreamWriteItems(benchmark::State& state) {
 }
 BENCHMARK(BM_StreamWriteItems)->Unit(benchmark::kMillisecond);
 
-}  // namespace
-
-namespace {
 // Peer: the standard hash map keyed by a copy of each name.
 void BM_StdUnorderedMapFindOrCreate(benchmark::State& state) {
-    const auto n = static_cast<std::size_t>(state.range(0));
-    std::vector<Sig> sigs = make_signals(n);
-    std::vector<const Sig*> refs;
-    for (const Sig& s : sigs)
-        refs.insert(refs.end(), 3, &s);
-    std::shuffle(refs.begin(), refs.end(), std::mt19937(1));
+    const std::vector<Sig> sigs = make_signals(static_cast<std::size_t>(state.range(0)));
+    const std::vector<const Sig*> refs = shuffled_references(sigs);
     for (auto _ : state) {
         std::unordered_map<std::string, const Sig*> map;
         std::size_t created = 0;

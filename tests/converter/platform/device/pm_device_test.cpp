@@ -4,7 +4,7 @@
 #include <string>
 
 #include "msg_capture.h"
-#include "pm_spec.h"
+#include "pm_device.h"
 #include "scratch_dir.h"
 
 namespace {
@@ -24,16 +24,16 @@ class DeviceTest : public testing::Test {
             ::unsetenv("HX_DEVICE_PATH");
         }
     }
-    const PM_SPEC spec_{nullptr, PM_BIND_DEVICE};
+    const PM_SPEC devices_{nullptr, PM_BIND_DEVICE};
     bool had_path_ = false;
     std::string old_path_;
 };
 
 TEST_F(DeviceTest, SampleDevicesOfTheDeviceFolderAreKnownInAnyCase) {
-    EXPECT_TRUE(spec_.isvalidpmname("qx10", 1));
-    EXPECT_TRUE(spec_.isvalidpmname("QX20", 1));
-    EXPECT_TRUE(spec_.isvalidpmname("Qz400", 1));
-    EXPECT_FALSE(spec_.isvalidpmname("qx11", 1));
+    EXPECT_TRUE(devices_.isvalidpmname("qx10", 1));
+    EXPECT_TRUE(devices_.isvalidpmname("QX20", 1));
+    EXPECT_TRUE(devices_.isvalidpmname("Qz400", 1));
+    EXPECT_FALSE(devices_.isvalidpmname("qx11", 1));
     EXPECT_NE(PM_SPEC::find_device_file("qx10").find("share/vrx/devices/qx10.acd"),
               std::string::npos);
 }
@@ -42,11 +42,11 @@ TEST_F(DeviceTest, NamesThatAreNotPlainFileNamesAreNeverLookedUp) {
     ScratchDir dir;
     ScratchDir::write_file(dir.file("evil.acd"), "");
     ::setenv("HX_DEVICE_PATH", dir.path().c_str(), 1);
-    EXPECT_TRUE(spec_.isvalidpmname("evil", 1));
+    EXPECT_TRUE(devices_.isvalidpmname("evil", 1));
     for (const char* name : {"", "../devices/qx10", "sub/qx10", ".qx10", "..", "."}) {
-        EXPECT_FALSE(spec_.isvalidpmname(name, 1)) << name;
+        EXPECT_FALSE(devices_.isvalidpmname(name, 1)) << name;
     }
-    EXPECT_FALSE(spec_.isvalidpmname(nullptr, 1));
+    EXPECT_FALSE(devices_.isvalidpmname(nullptr, 1));
 }
 
 TEST_F(DeviceTest, DevicePathIsSearchedInOrderAndEmptyEntriesNameNoDirectory) {
@@ -57,14 +57,14 @@ TEST_F(DeviceTest, DevicePathIsSearchedInOrderAndEmptyEntriesNameNoDirectory) {
     ::setenv("HX_DEVICE_PATH", path.c_str(), 1);
     EXPECT_EQ(PM_SPEC::find_device_file("qx10"), first.file("qx10.acd"));
     EXPECT_EQ(PM_SPEC::find_device_file("only2"), second.file("only2.acd"));
-    EXPECT_TRUE(spec_.isvalidpmname("qz400", 1));  // still found in the device folder
+    EXPECT_TRUE(devices_.isvalidpmname("qz400", 1));  // still found in the device folder
 }
 
 TEST_F(DeviceTest, UnknownDeviceIsReportedOnlyWhenAsked) {
     MsgCapture capture;
-    EXPECT_FALSE(spec_.isvalidpmname("nosuch", 1));
+    EXPECT_FALSE(devices_.isvalidpmname("nosuch", 1));
     EXPECT_TRUE(capture.messages().empty());
-    EXPECT_FALSE(spec_.isvalidpmname("nosuch", 0));
+    EXPECT_FALSE(devices_.isvalidpmname("nosuch", 0));
     EXPECT_EQ(capture.texts(PORT_MSG_WARNING),
               std::vector<std::string>{"no device description found for 'nosuch'\n"});
 }

@@ -1,4 +1,4 @@
-#include "pm_spec.h"
+#include "pm_device.h"
 
 #include <dlfcn.h>
 #include <sys/stat.h>
