@@ -1,32 +1,18 @@
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <string>
 
 #include "msg_capture.h"
 #include "pm_device.h"
+#include "scoped_env.h"
 #include "scratch_dir.h"
 
 namespace {
 
 class DeviceTest : public testing::Test {
   protected:
-    void SetUp() override {
-        const char* old = std::getenv("HX_DEVICE_PATH");
-        had_path_ = old != nullptr;
-        if (had_path_) old_path_ = old;
-        ::unsetenv("HX_DEVICE_PATH");
-    }
-    void TearDown() override {
-        if (had_path_) {
-            ::setenv("HX_DEVICE_PATH", old_path_.c_str(), 1);
-        } else {
-            ::unsetenv("HX_DEVICE_PATH");
-        }
-    }
+    ScopedEnv device_path_{"HX_DEVICE_PATH", nullptr};
     const PM_SPEC devices_{nullptr, PM_BIND_DEVICE};
-    bool had_path_ = false;
-    std::string old_path_;
 };
 
 TEST_F(DeviceTest, SampleDevicesOfTheDeviceFolderAreKnownInAnyCase) {
@@ -41,7 +27,7 @@ TEST_F(DeviceTest, SampleDevicesOfTheDeviceFolderAreKnownInAnyCase) {
 TEST_F(DeviceTest, NamesThatAreNotPlainFileNamesAreNeverLookedUp) {
     ScratchDir dir;
     ScratchDir::write_file(dir.file("evil.acd"), "");
-    ::setenv("HX_DEVICE_PATH", dir.path().c_str(), 1);
+    device_path_.set(dir.path().c_str());
     EXPECT_TRUE(devices_.isvalidpmname("evil", 1));
     for (const char* name : {"", "../devices/qx10", "sub/qx10", ".qx10", "..", "."}) {
         EXPECT_FALSE(devices_.isvalidpmname(name, 1)) << name;
@@ -54,7 +40,7 @@ TEST_F(DeviceTest, DevicePathIsSearchedInOrderAndEmptyEntriesNameNoDirectory) {
     ScratchDir::write_file(first.file("qx10.acd"), "first");
     ScratchDir::write_file(second.file("only2.acd"), "second");
     const std::string path = "::" + first.path() + ":/nonexistent:" + second.path() + "/";
-    ::setenv("HX_DEVICE_PATH", path.c_str(), 1);
+    device_path_.set(path.c_str());
     EXPECT_EQ(PM_SPEC::find_device_file("qx10"), first.file("qx10.acd"));
     EXPECT_EQ(PM_SPEC::find_device_file("only2"), second.file("only2.acd"));
     EXPECT_TRUE(devices_.isvalidpmname("qz400", 1));  // still found in the device folder

@@ -10,6 +10,7 @@
 #include "file_size_limit.h"
 #include "msg_capture.h"
 #include "port_file.h"
+#include "scoped_env.h"
 #include "scratch_dir.h"
 
 namespace {
@@ -136,22 +137,8 @@ TEST(File, RemoveDeletesAndReportsFailure) {
 
 class TmpnamTest : public testing::Test {
   protected:
-    void SetUp() override {
-        const char* old = std::getenv("TMPDIR");
-        had_tmpdir_ = old != nullptr;
-        if (had_tmpdir_) old_tmpdir_ = old;
-        ::setenv("TMPDIR", dir_.path().c_str(), 1);
-    }
-    void TearDown() override {
-        if (had_tmpdir_) {
-            ::setenv("TMPDIR", old_tmpdir_.c_str(), 1);
-        } else {
-            ::unsetenv("TMPDIR");
-        }
-    }
     ScratchDir dir_;
-    bool had_tmpdir_ = false;
-    std::string old_tmpdir_;
+    ScopedEnv tmpdir_{"TMPDIR", dir_.path().c_str()};
 };
 
 TEST_F(TmpnamTest, NeverGivesTheSameNameTwiceAndCreatesEachFilePrivately) {
@@ -177,7 +164,7 @@ TEST_F(TmpnamTest, NameDoesNotChangeUnderTheCallerAndABufferTooSmallLeavesNoFile
 }
 
 TEST_F(TmpnamTest, UnusableTmpdirFallsBackToTmp) {
-    ::setenv("TMPDIR", "/nonexistent/dir", 1);
+    tmpdir_.set("/nonexistent/dir");
     const char* name = Port::File::tmpnam();
     ASSERT_NE(name, nullptr);
     EXPECT_EQ(std::string(name).rfind("/tmp/", 0), 0u);

@@ -1,32 +1,20 @@
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <ctime>
-#include <string>
 
+#include "scoped_env.h"
 #include "ut_timestamp.h"
 
 namespace {
 
 class TimestampTest : public testing::Test {
   protected:
-    void SetUp() override {
-        const char* tz = std::getenv("TZ");
-        had_tz_ = tz != nullptr;
-        if (had_tz_) old_tz_ = tz;
-        ::setenv("TZ", "UTC", 1);
-        ::tzset();
-    }
-    void TearDown() override {
-        if (had_tz_) {
-            ::setenv("TZ", old_tz_.c_str(), 1);
-        } else {
-            ::unsetenv("TZ");
-        }
-        ::tzset();
-    }
-    bool had_tz_ = false;
-    std::string old_tz_;
+    void SetUp() override { ::tzset(); }
+    // Destroyed after utc_ has put the old zone back, so the library re-reads it.
+    struct ReloadZone {
+        ~ReloadZone() { ::tzset(); }
+    } reload_;
+    ScopedEnv utc_{"TZ", "UTC"};
 };
 
 TEST_F(TimestampTest, PiecesHaveTheirFixedForms) {
