@@ -247,11 +247,11 @@ UT_BLIST_ITER<HX_SIGNAL>* HX_BLOCK::create_global_siglist(uint8_t own_pins) cons
     if (own_pins) {
         for (uint16_t i = 0; i < pin_count_; ++i) note(pins_[i].inner_);
     }
-    return new HX_OWNED_ITER<HX_SIGNAL>(std::move(list));
+    return new UT_BLIST_ITER<HX_SIGNAL>(std::move(list));
 }
 
 void HX_BLOCK::delete_global_siglist(UT_BLIST_ITER<HX_SIGNAL>* iter) const {
-    delete static_cast<HX_OWNED_ITER<HX_SIGNAL>*>(iter);
+    delete iter;
 }
 
 HX_MAPSIGNAL* HX_BASEPHYSBLOCK::create_map_signal(uint16_t index, const char* name) {
@@ -349,11 +349,11 @@ UT_BLIST_ITER<HX_SIGNAL>* HX_NETWORK::create_signal_iter() const {
             members.push_back(s);
         } while (s != last_member_);
     }
-    return new HX_OWNED_ITER<HX_SIGNAL>(std::move(members));
+    return new UT_BLIST_ITER<HX_SIGNAL>(std::move(members));
 }
 
 void HX_NETWORK::delete_signal_iter(UT_BLIST_ITER<HX_SIGNAL>* iter) const {
-    delete static_cast<HX_OWNED_ITER<HX_SIGNAL>*>(iter);
+    delete iter;
 }
 
 void HX_MAPSIGNAL::set_name(const char* name) { name_ = block_->get_design()->intern(name); }

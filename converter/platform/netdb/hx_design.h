@@ -35,15 +35,6 @@ class HX_PRIMITIVE;
 class HX_SIGNAL;
 struct HX_DESIGN_STORAGE;
 
-/// An iterator that owns the list it walks: for lists composed on request.
-template <class T>
-class HX_OWNED_ITER : private std::vector<T*>, public UT_BLIST_ITER<T> {
-  public:
-    explicit HX_OWNED_ITER(std::vector<T*> items)
-        : std::vector<T*>(std::move(items)),
-          UT_BLIST_ITER<T>(static_cast<const std::vector<T*>&>(*this)) {}
-};
-
 /// A pin of a block or primitive.
 ///
 /// Layout, 40 bytes: properties 8 | name 8 | outer signal 8 | inner signal 8 |

@@ -9,15 +9,22 @@
 #pragma once
 
 #include <cstddef>
+#include <utility>
 #include <vector>
 
 template <class T>
 class UT_BLIST_ITER {
   public:
     explicit UT_BLIST_ITER(const std::vector<T*>& list) : list_(&list) {}
+    /// Walks a list composed for this walk, which the iterator keeps.
+    explicit UT_BLIST_ITER(std::vector<T*>&& items) : owned_(std::move(items)), list_(&owned_) {}
+    UT_BLIST_ITER(const UT_BLIST_ITER&) = delete;
+    UT_BLIST_ITER& operator=(const UT_BLIST_ITER&) = delete;
+
     T* l_next() { return pos_ < list_->size() ? (*list_)[pos_++] : nullptr; }
 
   private:
+    std::vector<T*> owned_;
     const std::vector<T*>* list_;
     std::size_t pos_ = 0;
 };
