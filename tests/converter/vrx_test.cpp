@@ -80,7 +80,8 @@ TEST(ConverterTest, CopiesOwnTheirFirstInputAndLeaveTheActiveConverterAlone) {
         EXPECT_EQ(A::db_file(copy), nullptr);
         VRX assigned = copy;
         assigned = vrx;
-        assigned = assigned;
+        VRX& same = assigned;
+        assigned = same;  // self-assignment keeps the name
         EXPECT_STREQ(A::first_input(assigned), "design.vrx");
     }
     // Destroying the copies neither freed the source's objects nor cleared

@@ -223,12 +223,18 @@ class HX_PRIMITIVE {
 };
 
 class HX_LOGPRIM : public HX_BASELOGBLOCK, public HX_PRIMITIVE {
+  public:
+    using HX_BASELOGBLOCK::get_pin_count;
+
   private:
     friend class HX_DESIGN;
     HX_LOGPRIM(uint8_t type, uint16_t width) : HX_PRIMITIVE(type, width, false) {}
 };
 
 class HX_PHYSPRIM : public HX_BASEPHYSBLOCK, public HX_PRIMITIVE {
+  public:
+    using HX_BASEPHYSBLOCK::get_pin_count;
+
   private:
     friend class HX_DESIGN;
     HX_PHYSPRIM(uint8_t type, uint16_t width) : HX_PRIMITIVE(type, width, true) {}
