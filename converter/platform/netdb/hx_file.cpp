@@ -1,0 +1,1425 @@
+// Binary design and library files; the layout is described in hx_file.h.
+#include "hx_file.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
+#include <mutex>
+#include <new>
+#include <unordered_map>
+#include <vector>
+
+#include "hx_design.h"
+#include "hx_library.h"
+#include "hx_prim_layout.h"
+#include "hx_storage.h"
+#include "port_file.h"
+#include "port_msg.h"
+#include "ut_ptrfile.h"
+
+#if defined(__x86_64__) && (defined(__GNUC__) || defined(__clang__))
+#include <nmmintrin.h>
+#define HX_FILE_HW_CRC 1
+#endif
+
+namespace {
+
+constexpr const char* kRevision = "$Revision: 1.0 $";
+constexpr std::size_t kMagicSize = 8;
+constexpr char kDesignMagic[kMagicSize + 1] = "\x89HXDSGN\n";
+constexpr char kLibraryMagic[kMagicSize + 1] = "\x89HXLIBR\n";
+constexpr std::size_t kChecksumEnd = 12;  // the checksum covers every byte from here on
+constexpr uint32_t kAbsent = 0xFFFFFFFF;
+// A global signal's connection to a pin's inner side has this bit in the
+// block index; merging a block's signal into a global one puts it there.
+constexpr uint32_t kInnerSide = 0x80000000;
+
+// Record flags.
+constexpr uint8_t kProps = 1;  // the object's properties are in the property section
+constexpr uint8_t kNamed = 2;  // pins: a name follows
+
+// Targets of object properties.
+enum ObjectKind : uint8_t {
+    kObjNone,
+    kObjLibrary,
+    kObjDesign,
+    kObjBlock,
+    kObjPin,
+    kObjSignal,
+    kObjNetwork,
+    kObjMap,
+};
+
+// Smallest encoded sizes, for checking counts against the bytes left.
+constexpr std::size_t kMinString = 4;
+constexpr std::size_t kMinPin = 4;
+constexpr std::size_t kMinBlock = 10 + kMinString;
+constexpr std::size_t kMinSignal = 9 + kMinString;
+constexpr std::size_t kMinConn = 6;
+constexpr std::size_t kMinNetwork = 9;
+constexpr std::size_t kMinMap = 11 + kMinString;
+constexpr std::size_t kMinParents = 8;
+constexpr std::size_t kMinDesign = kMinString + 25;
+constexpr std::size_t kMinAlias = kMinString + 4;
+constexpr std::size_t kMinProp = kMinString + 1;
+
+// --- CRC-32C -------------------------------------------------------------------
+// Hardware instructions where the processor has them (several GB/s), else
+// slicing by 8 tables; both give the same values.
+
+constexpr uint32_t kCrcPolynomial = 0x82F63B78;  // Castagnoli, reflected
+
+struct CrcTables {
+    uint32_t t[8][256];
+};
+
+constexpr CrcTables make_crc_tables() {
+    CrcTables tables{};
+    for (uint32_t i = 0; i < 256; ++i) {
+        uint32_t crc = i;
+        for (int bit = 0; bit < 8; ++bit)
+            crc = (crc >> 1) ^ ((crc & 1) ? kCrcPolynomial : 0);
+        tables.t[0][i] = crc;
+    }
+    for (int k = 1; k < 8; ++k) {
+        for (uint32_t i = 0; i < 256; ++i) {
+            const uint32_t prev = tables.t[k - 1][i];
+            tables.t[k][i] = (prev >> 8) ^ tables.t[0][prev & 0xFF];
+        }
+    }
+    return tables;
+}
+
+constexpr CrcTables kCrc = make_crc_tables();
+
+uint32_t load_le32(const uint8_t* p) {
+    return uint32_t{p[0]} | uint32_t{p[1]} << 8 | uint32_t{p[2]} << 16 | uint32_t{p[3]} << 24;
+}
+
+uint32_t crc_portable(uint32_t crc, const uint8_t* p, std::size_t n) {
+    const auto& t = kCrc.t;
+    for (; n >= 8; n -= 8, p += 8) {
+        const uint32_t one = load_le32(p) ^ crc;
+        const uint32_t two = load_le32(p + 4);
+        crc = t[7][one & 0xFF] ^ t[6][(one >> 8) & 0xFF] ^ t[5][(one >> 16) & 0xFF] ^
+              t[4][one >> 24] ^ t[3][two & 0xFF] ^ t[2][(two >> 8) & 0xFF] ^
+              t[1][(two >> 16) & 0xFF] ^ t[0][two >> 24];
+    }
+    for (; n > 0; --n, ++p)
+        crc = t[0][(crc ^ *p) & 0xFF] ^ (crc >> 8);
+    return crc;
+}
+
+#ifdef HX_FILE_HW_CRC
+__attribute__((target("sse4.2"))) uint32_t crc_hardware(uint32_t crc, const uint8_t* p,
+                                                        std::size_t n) {
+    uint64_t wide = crc;
+    for (; n >= 8; n -= 8, p += 8) {
+        uint64_t word;
+        std::memcpy(&word, p, sizeof word);
+        wide = _mm_crc32_u64(wide, word);
+    }
+    crc = static_cast<uint32_t>(wide);
+    for (; n > 0; --n, ++p)
+        crc = _mm_crc32_u8(crc, *p);
+    return crc;
+}
+
+bool have_hardware_crc() {
+    static const bool yes = __builtin_cpu_supports("sse4.2");
+    return yes;
+}
+#endif
+
+// --- little-endian output --------------------------------------------------------
+
+class Output {
+  public:
+    void u8(uint8_t v) { bytes_.push_back(static_cast<char>(v)); }
+    void u16(uint16_t v) { put(v); }
+    void u32(uint32_t v) { put(v); }
+    void u64(uint64_t v) { put(v); }
+    void text(const char* s) {
+        if (s == nullptr) {
+            u32(kAbsent);
+            return;
+        }
+        const std::size_t length = std::strlen(s);
+        u32(static_cast<uint32_t>(length));
+        bytes_.append(s, length + 1);
+    }
+    std::size_t size() const { return bytes_.size(); }
+    /// Overwrites a u32 written earlier (a count known only afterwards).
+    void patch_u32(std::size_t at, uint32_t v) {
+        for (int i = 0; i < 4; ++i)
+            bytes_[at + i] = static_cast<char>(v >> (8 * i));
+    }
+    std::string& bytes() { return bytes_; }
+
+  private:
+    template <class T>
+    void put(T v) {
+        char b[sizeof(T)];
+        for (std::size_t i = 0; i < sizeof(T); ++i)
+            b[i] = static_cast<char>(v >> (8 * i));
+        bytes_.append(b, sizeof(T));
+    }
+    std::string bytes_;
+};
+
+/// Open-addressing map from object addresses to their positions in the file,
+/// sized once: the encoder numbers every block of a design this way.
+class AddressIndex {
+  public:
+    explicit AddressIndex(std::size_t count) {
+        std::size_t capacity = 16;
+        int bits = 4;
+        while (capacity < count * 2) {
+            capacity *= 2;
+            ++bits;
+        }
+        slots_.assign(capacity, Slot{nullptr, 0});
+        shift_ = 64 - bits;
+    }
+    void add(const void* key, uint32_t value) {
+        std::size_t i = home(key);
+        while (slots_[i].key != nullptr)
+            i = (i + 1) & (slots_.size() - 1);
+        slots_[i] = Slot{key, value};
+    }
+    void prefetch(const void* key) const { __builtin_prefetch(&slots_[home(key)]); }
+    uint32_t find(const void* key) const {
+        for (std::size_t i = home(key);; i = (i + 1) & (slots_.size() - 1)) {
+            if (slots_[i].key == key) return slots_[i].value;
+            if (slots_[i].key == nullptr) return kAbsent;
+        }
+    }
+
+  private:
+    struct Slot {
+        const void* key;
+        uint32_t value;
+    };
+    std::size_t home(const void* key) const {
+        return static_cast<std::size_t>(reinterpret_cast<uintptr_t>(key) * 0x9E3779B97F4A7C15ull >>
+                                        shift_);
+    }
+    std::vector<Slot> slots_;
+    int shift_ = 60;
+};
+
+/// The connections of a design's signals, gathered first and then resolved
+/// to block positions in one sweep that prefetches ahead: with random
+/// netlists each lookup would otherwise wait for its own cache miss.
+struct ConnTable {
+    std::vector<uintptr_t> where;  // pin address (bit 0: inner side), then block position
+    std::vector<uint16_t> pins;
+    std::vector<uint32_t> counts;  // per signal
+    std::vector<const HX_PIN*> both_sides;
+
+    void add(const HX_PIN* pin, bool inner) {
+        where.push_back(reinterpret_cast<uintptr_t>(pin) | (inner ? 1 : 0));
+    }
+    /// True when a connection to this pin was seen before.
+    bool seen_both(const HX_PIN* pin) {
+        const bool seen = std::find(both_sides.begin(), both_sides.end(), pin) != both_sides.end();
+        both_sides.push_back(pin);
+        return seen;
+    }
+    /// Two sweeps: pins to their blocks (the block's address sits before
+    /// its pin array), then blocks to their positions.
+    void resolve(const AddressIndex& blocks) {
+        constexpr std::size_t kPin = 16, kHeader = 8;
+        const std::size_t n = where.size();
+        pins.resize(n);
+        for (std::size_t i = 0; i < n; ++i) {
+            if (i + kPin < n) __builtin_prefetch(pin_at(i + kPin));
+            if (i + kHeader < n) {
+                const HX_PIN* pin = pin_at(i + kHeader);
+                __builtin_prefetch(reinterpret_cast<const char*>(pin - pin->get_index()) -
+                                   sizeof(HX_BLOCK*));
+            }
+            const HX_PIN* pin = pin_at(i);
+            pins[i] = pin->get_index();
+            where[i] = reinterpret_cast<uintptr_t>(pin->get_block()) | (where[i] & 1);
+        }
+        auto block_of = [&](std::size_t i) {
+            return reinterpret_cast<const void*>(where[i] & ~uintptr_t{1});
+        };
+        for (std::size_t i = 0; i < n; ++i) {
+            if (i + kPin < n) blocks.prefetch(block_of(i + kPin));
+            const uint32_t side = (where[i] & 1) ? kInnerSide : 0;
+            where[i] = blocks.find(block_of(i)) | side;
+        }
+    }
+    const HX_PIN* pin_at(std::size_t i) const {
+        return reinterpret_cast<const HX_PIN*>(where[i] & ~uintptr_t{1});
+    }
+};
+
+/// Where an object property's target sits in the file.
+struct ObjectRef {
+    uint8_t kind = kObjNone;
+    uint32_t design = 0;
+    uint32_t index = 0;
+    uint16_t pin = 0;
+};
+
+/// A refusal of the file's content.
+struct Corrupt {
+    const char* what;
+};
+
+[[noreturn]] void corrupt(const char* what) {
+    throw Corrupt{what};
+}
+
+}  // namespace
+
+uint32_t HX_FILE_IO::checksum(const void* data, std::size_t size, uint32_t crc) {
+    const auto* p = static_cast<const uint8_t*>(data);
+#ifdef HX_FILE_HW_CRC
+    if (have_hardware_crc()) return ~crc_hardware(~crc, p, size);
+#endif
+    return ~crc_portable(~crc, p, size);
+}
+
+uint32_t HX_FILE_IO::checksum_portable(const void* data, std::size_t size, uint32_t crc) {
+    return ~crc_portable(~crc, static_cast<const uint8_t*>(data), size);
+}
+
+// --- writing ---------------------------------------------------------------------
+
+class HX_FILE_IO::Encoder {
+  public:
+    std::string design_file(const HX_DESIGN& design) {
+        out_.bytes().assign(kHeaderSize, '\0');
+        if (design.get_library() != nullptr)
+            refs_.emplace(design.get_library(), ObjectRef{kObjLibrary});
+        design_record(design);
+        property_section();
+        return finish(kDesignMagic);
+    }
+
+    std::string library_file(const HX_LIBRARY& library) {
+        out_.bytes().assign(kHeaderSize, '\0');
+        refs_.emplace(&library, ObjectRef{kObjLibrary});
+        out_.text(library.get_name());
+        out_.u8(library.get_casesense());
+        out_.u8(note_props(library));
+        designs_of(library);
+        out_.u32(static_cast<uint32_t>(designs_.size()));
+        for (const HX_DESIGN* design : designs_)
+            design_record(*design);
+        aliases(library);
+        property_section();
+        return finish(kLibraryMagic);
+    }
+
+  private:
+    /// The design's objects in file order, kept for object properties.
+    struct DesignLists {
+        const HX_DESIGN* design;
+        std::vector<const HX_SIGNAL*> signals;
+        std::vector<const HX_NETWORK*> networks;
+    };
+
+    uint8_t note_props(const HX_OBJECT& object) {
+        if (object.prop_count() == 0) return 0;
+        with_props_.push_back(&object);
+        return kProps;
+    }
+
+    void designs_of(const HX_LIBRARY& library) {
+        auto* iter = library.create_liblink_iter();
+        while (HX_LIBLINK* link = iter->l_next())
+            designs_.push_back(link->get_design());
+        library.delete_liblink_iter(iter);
+    }
+
+    void design_record(const HX_DESIGN& design) {
+        lists_.push_back(DesignLists{&design, {}, {}});
+        // Room for a typical design at once: pages never written cost nothing.
+        out_.bytes().reserve(out_.size() + design.blocks_.size() * 96 +
+                             design.networks_.size() * 48);
+        out_.text(design.get_name());
+        out_.u8(note_props(design));
+        out_.u32(design.last_tag_);
+        AddressIndex blocks(design.blocks_.size());
+        block_records(design, blocks);
+        signal_records(design, blocks);
+        network_records();
+        map_records(design, blocks);
+        parent_records(design, blocks);
+    }
+
+    void block_records(const HX_DESIGN& design, AddressIndex& index) {
+        out_.u32(static_cast<uint32_t>(design.blocks_.size()));
+        const HX_BLOCK* last_parent = nullptr;  // siblings mostly follow each other
+        uint32_t parent = 0;
+        for (std::size_t i = 0; i < design.blocks_.size(); ++i) {
+            const HX_BLOCK* block = design.blocks_[i];
+            if (i + 16 < design.blocks_.size()) index.prefetch(design.blocks_[i + 16]);
+            index.add(block, static_cast<uint32_t>(i));
+            if (block->parent_ != last_parent) {
+                last_parent = block->parent_;
+                parent = last_parent ? index.find(last_parent) + 1 : 0;
+            }
+            block_record(*block, parent);
+        }
+    }
+
+    void block_record(const HX_BLOCK& block, uint32_t parent) {
+        const HX_PRIMITIVE* prim = block.get_primitive();
+        out_.u8(block.flags_);
+        out_.u8(block.user_);
+        out_.u8(prim ? prim->get_type() : 0);
+        out_.u8(note_props(block));
+        out_.u16(prim ? prim->get_width() : block.pin_count_);
+        out_.u32(parent);
+        out_.text(block.name_);
+        const std::vector<const char*>* names = prim ? &default_pin_names(*prim) : nullptr;
+        for (uint16_t i = 0; i < block.pin_count_; ++i) {
+            pin_record(block.pins_[i], names ? (*names)[i] : nullptr);
+        }
+    }
+
+    /// The names that the pins of a fresh primitive of this kind get.
+    const std::vector<const char*>& default_pin_names(const HX_PRIMITIVE& prim) {
+        const uint32_t key = uint32_t{prim.get_type()} << 16 | prim.get_width();
+        if (key == names_key_ && !pin_names_.empty()) return pin_names_;
+        names_key_ = key;
+        pin_names_.clear();
+        hx_prim_for_each_pin(
+            prim.get_type(), prim.get_width(), [&](int32_t role, uint16_t ordinal, bool repeated) {
+                pin_names_.push_back(hx_prim_pin_name(role, repeated ? ordinal : HX_NO_INDEX));
+            });
+        return pin_names_;
+    }
+
+    /// `made_as` is the name the pin was made with (null for plain blocks);
+    /// the name is written only when it differs.
+    void pin_record(const HX_PIN& pin, const char* made_as) {
+        const bool same =
+            pin.name_ == made_as || (pin.name_ && made_as && std::strcmp(pin.name_, made_as) == 0);
+        out_.u8(static_cast<uint8_t>(note_props(pin) | (same ? 0 : kNamed)));
+        out_.u8(pin.dir_);
+        out_.u8(pin.mapinv_);
+        out_.u8(pin.inverted_);
+        if (!same) out_.text(pin.name_);
+    }
+
+    void signal_records(const HX_DESIGN& design, const AddressIndex& blocks) {
+        number_networks(design);
+        const std::vector<const HX_SIGNAL*>& signals = list_signals(design);
+        ConnTable conns;
+        for (std::size_t i = 0; i < signals.size(); ++i) {
+            prefetch_rings(signals, i);
+            gather_connections(*signals[i], conns);
+        }
+        conns.resolve(blocks);
+        out_.u32(static_cast<uint32_t>(signals.size()));
+        std::size_t next = 0;
+        for (std::size_t i = 0; i < signals.size(); ++i) {
+            const HX_SIGNAL& signal = *signals[i];
+            out_.u32(owners_[i]);
+            out_.u8(note_props(signal));
+            out_.text(signal.name_);
+            out_.u32(conns.counts[i]);
+            for (uint32_t c = 0; c < conns.counts[i]; ++c, ++next) {
+                out_.u32(static_cast<uint32_t>(conns.where[next]));
+                out_.u16(conns.pins[next]);
+            }
+        }
+    }
+
+    /// File positions of the design's networks, and their highest signals.
+    void number_networks(const HX_DESIGN& design) {
+        std::vector<const HX_NETWORK*>& nets = lists_.back().networks;
+        net_index_.assign(design.networks_.size(), kAbsent);
+        for (std::size_t i = 0; i < design.networks_.size(); ++i) {
+            if (design.networks_[i] == nullptr) continue;
+            net_index_[i] = static_cast<uint32_t>(nets.size());
+            nets.push_back(design.networks_[i]);
+        }
+        highest_.assign(nets.size(), kAbsent);
+    }
+
+    /// The signals in file order: the globals, then each block's.
+    const std::vector<const HX_SIGNAL*>& list_signals(const HX_DESIGN& design) {
+        std::vector<const HX_SIGNAL*>& signals = lists_.back().signals;
+        owners_.clear();
+        auto add = [&](const HX_SIGNAL* signal, uint32_t owner) {
+            const HX_NETWORK* net = signal->network_;
+            if (net != nullptr && net->highest_ == signal) {
+                highest_[net_index_[net->slot_]] = static_cast<uint32_t>(signals.size());
+            }
+            signals.push_back(signal);
+            owners_.push_back(owner);
+        };
+        for (const HX_SIGNAL* global : design.globals_)
+            add(global, 0);
+        for (std::size_t b = 0; b < design.blocks_.size(); ++b) {
+            const std::vector<HX_SIGNAL*>* list = design.blocks_[b]->signals_;
+            if (list == nullptr) continue;
+            for (const HX_SIGNAL* signal : *list) {
+                if (signal != nullptr) add(signal, static_cast<uint32_t>(b + 1));
+            }
+        }
+        return signals;
+    }
+
+    /// Connections are small nodes spread over the design's memory; walking
+    /// them one miss at a time dominates writing a large design. This brings
+    /// the next signals' first few ring nodes in ahead of the walk.
+    static void prefetch_rings(const std::vector<const HX_SIGNAL*>& signals, std::size_t i) {
+        // Each hop gets a few signals' worth of time to arrive before the next.
+        constexpr std::size_t kSignal = 40, kLast = 30, kFirst = 20, kSecond = 10, kThird = 5;
+        const std::size_t n = signals.size();
+        if (i + kSignal < n) __builtin_prefetch(signals[i + kSignal]);
+        if (i + kLast < n) prefetch_node(signals[i + kLast]->last_conn_, 0);
+        if (i + kFirst < n) prefetch_node(signals[i + kFirst]->last_conn_, 1);
+        if (i + kSecond < n) prefetch_node(signals[i + kSecond]->last_conn_, 2);
+        if (i + kThird < n) prefetch_node(signals[i + kThird]->last_conn_, 3);
+    }
+
+    /// Fetches the ring node `hops` steps after `last`; the nodes before it
+    /// were asked for earlier.
+    static void prefetch_node(const HX_CONN* node, int hops) {
+        if (node == nullptr) return;
+        for (int h = 1; h < hops; ++h)
+            node = node->next_;
+        __builtin_prefetch(hops == 0 ? node : node->next_);
+    }
+
+    /// A signal's connections in order. A global signal may sit on either
+    /// side of a pin, or on both, in which case its two connections to the
+    /// pin are alike; the second is taken as the inner one.
+    static void gather_connections(const HX_SIGNAL& signal, ConnTable& table) {
+        uint32_t count = 0;
+        table.both_sides.clear();
+        const HX_CONN* last = signal.last_conn_;
+        for (const HX_CONN* conn = last; conn != nullptr && (count == 0 || conn != last);) {
+            conn = conn->next_;
+            const HX_PIN* pin = conn->pin_;
+            bool inner = signal.is_global() && pin->inner_ == &signal;
+            if (inner && pin->outer_ == &signal) {
+                inner = table.seen_both(pin);
+            }
+            table.add(pin, inner);
+            ++count;
+        }
+        table.counts.push_back(count);
+    }
+
+    /// A ring of connections; `skip_first` leaves out a map signal's own pin.
+    void connections(const HX_CONN* last, const AddressIndex& blocks, bool skip_first) {
+        const std::size_t at = out_.size();
+        out_.u32(0);
+        uint32_t count = 0;
+        if (last != nullptr) {
+            const HX_CONN* conn = last;
+            do {
+                conn = conn->next_;
+                if (skip_first && conn == last->next_) continue;
+                out_.u32(blocks.find(conn->pin_->get_block()));
+                out_.u16(conn->pin_->index_);
+                ++count;
+            } while (conn != last);
+        }
+        out_.patch_u32(at, count);
+    }
+
+    void network_records() {
+        const auto& nets = lists_.back().networks;
+        out_.u32(static_cast<uint32_t>(nets.size()));
+        for (std::size_t k = 0; k < nets.size(); ++k) {
+            out_.u32(nets[k]->tag_);
+            out_.u32(highest_[k]);
+            out_.u8(note_props(*nets[k]));
+        }
+    }
+
+    void map_records(const HX_DESIGN& design, const AddressIndex& blocks) {
+        out_.u32(static_cast<uint32_t>(design.mapsignals_.size()));
+        for (const HX_MAPSIGNAL* map : design.mapsignals_) {
+            out_.u32(blocks.find(map->block_));
+            out_.u16(map->pin_);
+            out_.u8(note_props(*map));
+            out_.text(map->name_);
+            connections(map->last_conn_, blocks, true);
+        }
+    }
+
+    /// Each physical block's logical children, in the order given.
+    void parent_records(const HX_DESIGN& design, const AddressIndex& blocks) {
+        const std::size_t at = out_.size();
+        out_.u32(0);
+        uint32_t count = 0;
+        for (std::size_t b = 0; b < design.blocks_.size() && !design.log_children_.empty(); ++b) {
+            auto it = design.log_children_.find(design.blocks_[b]);
+            if (it == design.log_children_.end() || it->second.empty()) continue;
+            out_.u32(static_cast<uint32_t>(b));
+            out_.u32(static_cast<uint32_t>(it->second.size()));
+            for (const HX_BLOCK* child : it->second)
+                out_.u32(blocks.find(child));
+            ++count;
+        }
+        out_.patch_u32(at, count);
+    }
+
+    void aliases(const HX_LIBRARY& library) {
+        std::unordered_map<const HX_DESIGN*, uint32_t> index;
+        for (std::size_t i = 0; i < designs_.size(); ++i) {
+            index.emplace(designs_[i], static_cast<uint32_t>(i));
+        }
+        out_.u32(static_cast<uint32_t>(library.aliases().size()));
+        for (const auto& [alias, design] : library.aliases()) {
+            out_.text(alias.c_str());
+            out_.u32(index.at(design));
+        }
+    }
+
+    void property_section() {
+        for (const HX_OBJECT* object : with_props_) {
+            const HX_PROPLIST* list = object->get_props();
+            out_.u32(static_cast<uint32_t>(list->count()));
+            for (const HX_PROPERTY* prop : list->items()) {
+                if (prop != nullptr) property(*prop);
+            }
+        }
+    }
+
+    void property(const HX_PROPERTY& prop) {
+        out_.text(prop.get_name());
+        out_.u8(static_cast<uint8_t>(prop.get_kind()));
+        HX_PROP_PINREF_DATA record;
+        HX_PROP_TIMING_DATA timing;
+        switch (prop.get_kind()) {
+            case HX_PROP_INT:
+                out_.u32(static_cast<uint32_t>(prop.get_int()));
+                break;
+            case HX_PROP_FLOAT: {
+                const double value = prop.get_float();
+                uint64_t bits;
+                std::memcpy(&bits, &value, sizeof bits);
+                out_.u64(bits);
+                break;
+            }
+            case HX_PROP_STRING:
+            case HX_PROP_PARAM:
+            case HX_PROP_TIMINGSTR:
+                out_.text(prop.get_text());
+                break;
+            case HX_PROP_OBJECT:
+                object_ref(prop.get_object());
+                break;
+            case HX_PROP_TIMING:
+                prop.get_timing(timing);
+                times(timing.min, timing.max, timing.unit);
+                break;
+            case HX_PROP_PINREF:
+                prop.get_pinref(record);
+                times(record.min, record.max, record.unit);
+                out_.u16(record.pin);
+                out_.u32(static_cast<uint32_t>(record.edge));
+                out_.u8(record.inverted);
+                break;
+            default:
+                break;
+        }
+    }
+
+    void times(int32_t min, int32_t max, int32_t unit) {
+        out_.u32(static_cast<uint32_t>(min));
+        out_.u32(static_cast<uint32_t>(max));
+        out_.u32(static_cast<uint32_t>(unit));
+    }
+
+    void object_ref(const HX_OBJECT* target) {
+        if (target != nullptr && !refs_built_) build_refs();
+        ObjectRef ref;
+        if (target != nullptr) {
+            auto it = refs_.find(target);
+            if (it != refs_.end()) ref = it->second;
+        }
+        out_.u8(ref.kind);
+        out_.u32(ref.design);
+        out_.u32(ref.index);
+        out_.u16(ref.pin);
+    }
+
+    /// Positions of every object that an object property may point at; made
+    /// on the first such property only.
+    void build_refs() {
+        refs_built_ = true;
+        for (uint32_t d = 0; d < lists_.size(); ++d) {
+            const DesignLists& lists = lists_[d];
+            refs_.emplace(lists.design, ObjectRef{kObjDesign, d});
+            const auto& blocks = lists.design->blocks_;
+            for (uint32_t b = 0; b < blocks.size(); ++b) {
+                refs_.emplace(blocks[b], ObjectRef{kObjBlock, d, b});
+                for (uint16_t p = 0; p < blocks[b]->pin_count_; ++p) {
+                    refs_.emplace(&blocks[b]->pins_[p], ObjectRef{kObjPin, d, b, p});
+                }
+            }
+            add_refs(lists.signals, kObjSignal, d);
+            add_refs(lists.networks, kObjNetwork, d);
+            add_refs(lists.design->mapsignals_, kObjMap, d);
+        }
+    }
+
+    template <class T>
+    void add_refs(const std::vector<T*>& list, uint8_t kind, uint32_t design) {
+        for (uint32_t i = 0; i < list.size(); ++i) {
+            refs_.emplace(list[i], ObjectRef{kind, design, i});
+        }
+    }
+
+    std::string finish(const char* magic) {
+        std::string& bytes = out_.bytes();
+        Output header;
+        header.u32(kFormatVersion);
+        header.u64(bytes.size() - kHeaderSize);
+        header.u64(0);
+        std::memcpy(bytes.data(), magic, kMagicSize);
+        std::memcpy(bytes.data() + kChecksumEnd, header.bytes().data(), header.size());
+        const uint32_t crc = checksum(bytes.data() + kChecksumEnd, bytes.size() - kChecksumEnd);
+        Output sum;
+        sum.u32(crc);
+        std::memcpy(bytes.data() + kMagicSize, sum.bytes().data(), 4);
+        return std::move(bytes);
+    }
+
+    Output out_;
+    std::vector<const HX_DESIGN*> designs_;
+    std::vector<DesignLists> lists_;
+    std::vector<const HX_OBJECT*> with_props_;
+    std::vector<uint32_t> net_index_;  // design's network slot -> file position
+    std::vector<uint32_t> highest_;    // file network -> its highest signal
+    std::vector<uint32_t> owners_;     // file signal -> its block's position + 1, or 0
+    uint32_t names_key_ = kAbsent;
+    std::vector<const char*> pin_names_;
+    std::unordered_map<const void*, ObjectRef> refs_;
+    bool refs_built_ = false;
+};
+
+std::string HX_FILE_IO::encode(const HX_DESIGN& design) {
+    return Encoder().design_file(design);
+}
+
+std::string HX_FILE_IO::encode(const HX_LIBRARY& library) {
+    return Encoder().library_file(library);
+}
+
+// --- reading ---------------------------------------------------------------------
+
+class HX_FILE_IO::Decoder {
+  public:
+    Decoder(const uint8_t* body, std::size_t size) : p_(body), end_(body + size) {}
+
+    std::unique_ptr<HX_LIBRARY> design_file() {
+        const char* name = peek_design_name();
+        library_ = std::make_unique<HX_LIBRARY>(name, 0);
+        design_record();
+        property_section();
+        expect_end();
+        return std::move(library_);
+    }
+
+    std::unique_ptr<HX_LIBRARY> library_file() {
+        const char* name = text();
+        const uint8_t casesense = u8();
+        const uint8_t flags = u8();
+        if (casesense > 1 || (flags & ~kProps) != 0) corrupt("bad library record");
+        library_ = std::make_unique<HX_LIBRARY>(name, casesense);
+        note_props(flags, library_.get());
+        const uint32_t designs = count(kMinDesign);
+        designs_.reserve(designs);
+        for (uint32_t i = 0; i < designs; ++i)
+            design_record();
+        aliases();
+        property_section();
+        expect_end();
+        return std::move(library_);
+    }
+
+  private:
+    /// A design's objects by file position.
+    struct DesignObjects {
+        HX_DESIGN* design = nullptr;
+        std::vector<HX_BLOCK*> blocks;
+        std::vector<HX_SIGNAL*> signals;
+        std::vector<int32_t> signal_rank;  // -1 global, else the block's depth
+        std::vector<uint32_t> block_depth;
+        std::vector<HX_NETWORK*> networks;
+    };
+
+    // The cursor: every read is checked against the end of the content.
+    std::size_t left() const { return static_cast<std::size_t>(end_ - p_); }
+    void need(std::size_t n) const {
+        if (left() < n) corrupt("content ends early");
+    }
+    template <class T>
+    T get() {
+        need(sizeof(T));
+        T v = 0;
+        for (std::size_t i = 0; i < sizeof(T); ++i)
+            v = static_cast<T>(v | T{p_[i]} << (8 * i));
+        p_ += sizeof(T);
+        return v;
+    }
+    uint8_t u8() { return get<uint8_t>(); }
+    uint16_t u16() { return get<uint16_t>(); }
+    uint32_t u32() { return get<uint32_t>(); }
+    uint64_t u64() { return get<uint64_t>(); }
+    int32_t i32() { return static_cast<int32_t>(u32()); }
+
+    /// A count of records of at least `min_size` bytes each, checked against
+    /// the bytes left before anyone allocates for them.
+    uint32_t count(std::size_t min_size) {
+        const uint32_t n = u32();
+        if (n > left() / min_size) corrupt("a count exceeds the content");
+        return n;
+    }
+
+    /// A name in place: the file's bytes end in a 0 byte and hold no other.
+    const char* text() {
+        const uint32_t length = u32();
+        if (length == kAbsent) return nullptr;
+        if (length >= left()) corrupt("a name runs past the end");
+        const char* s = reinterpret_cast<const char*>(p_);
+        if (p_[length] != 0 || std::memchr(s, 0, length) != nullptr) corrupt("a name is not text");
+        p_ += length + 1;
+        return s;
+    }
+
+    const char* peek_design_name() {
+        const uint8_t* at = p_;
+        const char* name = text();
+        p_ = at;
+        return name;
+    }
+
+    void expect_end() const {
+        if (p_ != end_) corrupt("bytes after the content");
+    }
+
+    void note_props(uint8_t flags, HX_OBJECT* object) {
+        if (flags & kProps) with_props_.push_back(object);
+    }
+
+    void design_record() {
+        DesignObjects& objects = designs_.emplace_back();
+        const char* name = text();
+        const uint8_t flags = u8();
+        const uint32_t last_tag = u32();
+        if ((flags & ~kProps) != 0) corrupt("bad design record");
+        objects.design = library_->create_design(name);
+        if (objects.design == nullptr) corrupt("a design name is absent or taken");
+        note_props(flags, objects.design);
+        block_records(objects);
+        signal_records(objects);
+        network_records(objects);
+        map_records(objects);
+        parent_records(objects);
+        objects.design->last_tag_ = last_tag;
+    }
+
+    void block_records(DesignObjects& objects) {
+        const uint32_t n = count(kMinBlock);
+        objects.blocks.reserve(n);
+        objects.block_depth.reserve(n);
+        for (uint32_t i = 0; i < n; ++i)
+            block_record(objects);
+    }
+
+    void block_record(DesignObjects& objects) {
+        const uint8_t kind = u8();
+        const uint8_t user = u8();
+        const uint8_t type = u8();
+        const uint8_t flags = u8();
+        const uint16_t width = u16();
+        const uint32_t parent = u32();
+        const char* name = text();
+        if (kind > (HX_BLK_PHYSICAL | HX_BLK_PRIMITIVE) || (flags & ~kProps) != 0 ||
+            (!(kind & HX_BLK_PRIMITIVE) && type != 0))
+            corrupt("bad block record");
+        if (parent > objects.blocks.size()) corrupt("a block's parent is unknown");
+        HX_BLOCK* up = parent ? objects.blocks[parent - 1] : nullptr;
+        const uint32_t pins =
+            (kind & HX_BLK_PRIMITIVE) ? HX_PRIMITIVE::pin_count_for(type, width) : width;
+        if (pins > left() / kMinPin) corrupt("pins run past the end");
+        HX_BLOCK* block = make_block(*objects.design, kind, up, type, width, name);
+        const HX_PRIMITIVE* prim = block->get_primitive();
+        if (prim != nullptr && prim->get_width() != width) corrupt("bad primitive width");
+        block->user_ = user;
+        note_props(flags, block);
+        for (uint16_t i = 0; i < block->pin_count_; ++i)
+            pin_record(*objects.design, block->pins_[i]);
+        objects.blocks.push_back(block);
+        objects.block_depth.push_back(up ? objects.block_depth[parent - 1] + 1 : 0);
+    }
+
+    /// Makes the block through the design, which refuses a parent of the
+    /// other kind, a primitive parent or a second root.
+    static HX_BLOCK* make_block(HX_DESIGN& design, uint8_t kind, HX_BLOCK* parent, uint8_t type,
+                                uint16_t width, const char* name) {
+        const bool physical = (kind & HX_BLK_PHYSICAL) != 0;
+        if (parent != nullptr && parent->is_physical() != physical) {
+            corrupt("a block's parent is of the other kind");
+        }
+        HX_BLOCK* block = nullptr;
+        if (physical) {
+            auto* up = static_cast<HX_BASEPHYSBLOCK*>(parent);
+            block = (kind & HX_BLK_PRIMITIVE)
+                        ? static_cast<HX_BLOCK*>(design.create_physprim(up, type, width, name))
+                        : design.create_physblock(up, width, name);
+        } else {
+            auto* up = static_cast<HX_BASELOGBLOCK*>(parent);
+            block = (kind & HX_BLK_PRIMITIVE)
+                        ? static_cast<HX_BLOCK*>(design.create_logprim(up, type, width, name))
+                        : design.create_logblock(up, width, name);
+        }
+        if (block == nullptr) corrupt("a block cannot be made");
+        return block;
+    }
+
+    void pin_record(HX_DESIGN& design, HX_PIN& pin) {
+        const uint8_t flags = u8();
+        pin.dir_ = u8();
+        pin.mapinv_ = u8();
+        pin.inverted_ = u8();
+        if ((flags & ~(kProps | kNamed)) != 0) corrupt("bad pin record");
+        if (flags & kNamed) pin.name_ = design.intern(text());
+        note_props(flags, &pin);
+    }
+
+    void signal_records(DesignObjects& objects) {
+        const uint32_t n = count(kMinSignal);
+        objects.signals.reserve(n);
+        objects.signal_rank.reserve(n);
+        for (uint32_t i = 0; i < n; ++i)
+            signal_record(objects);
+    }
+
+    void signal_record(DesignObjects& objects) {
+        const uint32_t owner = u32();
+        const uint8_t flags = u8();
+        const char* name = text();
+        if ((flags & ~kProps) != 0) corrupt("bad signal record");
+        if (owner > objects.blocks.size()) corrupt("a signal's block is unknown");
+        HX_SIGNAL* signal = owner == 0
+                                ? make_global(*objects.design, name)
+                                : objects.design->create_signal(objects.blocks[owner - 1], name);
+        if (signal == nullptr) corrupt("a signal cannot be made");
+        note_props(flags, signal);
+        objects.signals.push_back(signal);
+        objects.signal_rank.push_back(
+            owner == 0 ? -1 : static_cast<int32_t>(objects.block_depth[owner - 1]));
+        const uint32_t conns = count(kMinConn);
+        for (uint32_t i = 0; i < conns; ++i) {
+            const uint32_t raw = u32();
+            HX_BLOCK* block = block_at(objects, raw & ~kInnerSide);
+            const uint16_t pin = u16();
+            if ((raw & kInnerSide) == 0) {
+                if (objects.design->create_conn(signal, block, pin) == nullptr) {
+                    corrupt("a connection cannot be made");
+                }
+            } else if (owner != 0) {
+                corrupt("a connection cannot be made");
+            } else {
+                connect_inside(*objects.design, signal, block, pin);
+            }
+        }
+    }
+
+    /// What create_conn does, for the inner side that it keeps for the
+    /// block's own signals.
+    static void connect_inside(HX_DESIGN& design, HX_SIGNAL* global, HX_BLOCK* block,
+                               uint16_t index) {
+        HX_PIN* pin = block->get_pin(index);
+        if (pin == nullptr || pin->inner_ != nullptr) corrupt("a connection cannot be made");
+        pin->inner_ = global;
+        HX_DESIGN::append_conn(global->last_conn_, design.make_conn(pin));
+        if (pin->outer_ != nullptr) design.join_networks(pin->outer_->network_, global->network_);
+    }
+
+    /// A global signal; one without a name, or with the name of an earlier
+    /// one (both possible after renaming), is made under a name of its own
+    /// and then renamed, as it was made originally.
+    static HX_SIGNAL* make_global(HX_DESIGN& design, const char* name) {
+        if (HX_SIGNAL* global = design.create_global_signal(name)) return global;
+        std::string stand_in = "\x01";
+        HX_SIGNAL* global = nullptr;
+        while (global == nullptr) {
+            stand_in += '\x01';
+            global = design.create_global_signal(stand_in.c_str());
+        }
+        global->set_name(name);
+        return global;
+    }
+
+    static HX_BLOCK* block_at(const DesignObjects& objects, uint32_t index) {
+        if (index >= objects.blocks.size()) corrupt("a block index is out of range");
+        return objects.blocks[index];
+    }
+
+    /// The connections made the networks; the records give each its tag,
+    /// its highest signal and its place in the design's order.
+    void network_records(DesignObjects& objects) {
+        HX_DESIGN& design = *objects.design;
+        const uint32_t n = count(kMinNetwork);
+        if (n != design.network_count_) corrupt("the networks do not match the connections");
+        for (HX_NETWORK* net : design.networks_) {
+            if (net != nullptr) net->slot_ = kAbsent;
+        }
+        objects.networks.reserve(n);
+        std::vector<uint32_t> top(n);
+        std::vector<uint32_t> tags(n);
+        for (uint32_t k = 0; k < n; ++k) {
+            tags[k] = u32();
+            top[k] = u32();
+            const uint8_t flags = u8();
+            if ((flags & ~kProps) != 0 || top[k] >= objects.signals.size()) {
+                corrupt("bad network record");
+            }
+            HX_NETWORK* net = objects.signals[top[k]]->network_;
+            if (net->slot_ != kAbsent) corrupt("two network records name one network");
+            net->slot_ = k;
+            net->highest_ = objects.signals[top[k]];
+            note_props(flags, net);
+            objects.networks.push_back(net);
+        }
+        check_highest(objects, top);
+        objects.design->networks_ = objects.networks;
+        retag(*objects.design, objects.networks, tags);
+    }
+
+    /// The highest signal named by a record must be nearest the root.
+    static void check_highest(const DesignObjects& objects, const std::vector<uint32_t>& top) {
+        for (std::size_t i = 0; i < objects.signals.size(); ++i) {
+            const uint32_t k = objects.signals[i]->network_->slot_;
+            if (objects.signal_rank[i] < objects.signal_rank[top[k]]) {
+                corrupt("a network's highest signal is not its highest");
+            }
+        }
+    }
+
+    /// Gives the networks the tags of the file. Rebuilding made the same
+    /// tags as the original in the usual case, so only the others move: all
+    /// their old tags go before any new one comes in.
+    static void retag(HX_DESIGN& design, const std::vector<HX_NETWORK*>& nets,
+                      const std::vector<uint32_t>& tags) {
+        HX_TAG_TABLE& table = design.store_->tags;
+        for (std::size_t k = 0; k < nets.size(); ++k) {
+            if (nets[k]->tag_ != tags[k]) table.erase(nets[k]->tag_);
+        }
+        for (std::size_t k = 0; k < nets.size(); ++k) {
+            if (nets[k]->tag_ == tags[k]) continue;
+            nets[k]->tag_ = tags[k];
+            if (!table.insert(nets[k])) corrupt("two networks share a tag");
+        }
+    }
+
+    void map_records(DesignObjects& objects) {
+        const uint32_t n = count(kMinMap);
+        for (uint32_t i = 0; i < n; ++i) {
+            HX_BLOCK* block = block_at(objects, u32());
+            const uint16_t pin = u16();
+            const uint8_t flags = u8();
+            const char* name = text();
+            if (!block->is_physical() || (flags & ~kProps) != 0) corrupt("bad map signal record");
+            HX_MAPSIGNAL* map = static_cast<HX_BASEPHYSBLOCK*>(block)->create_map_signal(pin, name);
+            if (map == nullptr) corrupt("a map signal cannot be made");
+            note_props(flags, map);
+            const uint32_t conns = count(kMinConn);
+            for (uint32_t c = 0; c < conns; ++c) {
+                HX_BLOCK* log = block_at(objects, u32());
+                if (map->create_mapconn(log, u16()) == nullptr) {
+                    corrupt("a map connection cannot be made");
+                }
+            }
+        }
+    }
+
+    void parent_records(DesignObjects& objects) {
+        const uint32_t n = count(kMinParents);
+        for (uint32_t i = 0; i < n; ++i) {
+            HX_BLOCK* phys = block_at(objects, u32());
+            if (!phys->is_physical()) corrupt("a physical parent is a logical block");
+            const uint32_t children = count(4);
+            for (uint32_t c = 0; c < children; ++c) {
+                HX_BLOCK* log = block_at(objects, u32());
+                if (!objects.design->set_block_phys_parent(log,
+                                                           static_cast<HX_BASEPHYSBLOCK*>(phys))) {
+                    corrupt("a physical parent cannot be set");
+                }
+            }
+        }
+    }
+
+    void aliases() {
+        const uint32_t n = count(kMinAlias);
+        for (uint32_t i = 0; i < n; ++i) {
+            const char* alias = text();
+            const uint32_t design = u32();
+            if (design >= designs_.size()) corrupt("an alias names an unknown design");
+            if (!library_->alias_design(designs_[design].design->get_name(), alias)) {
+                corrupt("an alias cannot be made");
+            }
+        }
+    }
+
+    void property_section() {
+        for (HX_OBJECT* object : with_props_) {
+            const uint32_t n = count(kMinProp);
+            if (n == 0) corrupt("an empty property list");
+            for (uint32_t i = 0; i < n; ++i)
+                object->create_prop(property(), nullptr);
+            if (object->prop_count() != static_cast<int>(n)) corrupt("a property name repeats");
+        }
+    }
+
+    std::unique_ptr<HX_PROPERTY> property() {
+        const char* name = text();
+        const uint8_t kind = u8();
+        if (name == nullptr) corrupt("a property has no name");
+        switch (kind) {
+            case HX_PROP_FLAG:
+                return HX_PROPERTY::make_flag(name);
+            case HX_PROP_INT:
+                return HX_PROPERTY::make_int(name, i32());
+            case HX_PROP_FLOAT: {
+                const uint64_t bits = u64();
+                double value;
+                std::memcpy(&value, &bits, sizeof value);
+                return HX_PROPERTY::make_float(name, value);
+            }
+            case HX_PROP_STRING:
+            case HX_PROP_PARAM:
+            case HX_PROP_TIMINGSTR:
+                return HX_PROPERTY::make_text(name, static_cast<HX_PROP_TYPE>(kind),
+                                              property_text());
+            case HX_PROP_OBJECT:
+                return HX_PROPERTY::make_object(name, object_ref());
+            case HX_PROP_TIMING:
+                return HX_PROPERTY::make_timing(name, timing());
+            case HX_PROP_PINREF:
+                return HX_PROPERTY::make_pinref(name, pinref());
+            default:
+                corrupt("unknown property kind");
+        }
+    }
+
+    const char* property_text() {
+        const char* value = text();
+        if (value == nullptr) corrupt("a property has no text");
+        return value;
+    }
+
+    HX_PROP_TIMING_DATA timing() {
+        HX_PROP_TIMING_DATA record;
+        record.min = i32();
+        record.max = i32();
+        record.unit = i32();
+        return record;
+    }
+
+    HX_PROP_PINREF_DATA pinref() {
+        HX_PROP_PINREF_DATA record;
+        record.min = i32();
+        record.max = i32();
+        record.unit = i32();
+        record.pin = u16();
+        record.edge = i32();
+        record.inverted = u8();
+        return record;
+    }
+
+    HX_OBJECT* object_ref() {
+        const uint8_t kind = u8();
+        const uint32_t design = u32();
+        const uint32_t index = u32();
+        const uint16_t pin = u16();
+        if (kind == kObjNone || kind == kObjLibrary) {
+            if (design != 0 || index != 0 || pin != 0) corrupt("bad object reference");
+            return kind == kObjNone ? nullptr : library_.get();
+        }
+        if (design >= designs_.size()) corrupt("an object reference names an unknown design");
+        const DesignObjects& objects = designs_[design];
+        switch (kind) {
+            case kObjDesign:
+                return objects.design;
+            case kObjBlock:
+                return block_at(objects, index);
+            case kObjPin:
+                return pin_at(objects, index, pin);
+            case kObjSignal:
+                return at(objects.signals, index);
+            case kObjNetwork:
+                return at(objects.networks, index);
+            case kObjMap:
+                return at(objects.design->mapsignals_, index);
+            default:
+                corrupt("bad object reference");
+        }
+    }
+
+    static HX_PIN* pin_at(const DesignObjects& objects, uint32_t block, uint16_t pin) {
+        HX_PIN* found = block_at(objects, block)->get_pin(pin);
+        if (found == nullptr) corrupt("an object reference names an unknown pin");
+        return found;
+    }
+
+    template <class T>
+    static T* at(const std::vector<T*>& list, uint32_t index) {
+        if (index >= list.size()) corrupt("an object reference is out of range");
+        return list[index];
+    }
+
+    const uint8_t* p_;
+    const uint8_t* end_;
+    std::unique_ptr<HX_LIBRARY> library_;
+    std::vector<DesignObjects> designs_;
+    std::vector<HX_OBJECT*> with_props_;
+};
+
+namespace {
+
+uint32_t header_u32(const uint8_t* p) {
+    return load_le32(p);
+}
+uint64_t header_u64(const uint8_t* p) {
+    return uint64_t{load_le32(p)} | uint64_t{load_le32(p + 4)} << 32;
+}
+
+bool is_prefix_of_magic(const uint8_t* data, std::size_t size) {
+    return std::memcmp(data, kDesignMagic, size) == 0 ||
+           std::memcmp(data, kLibraryMagic, size) == 0;
+}
+
+std::string format(const char* text, unsigned long long a, unsigned long long b) {
+    char buffer[160];
+    std::snprintf(buffer, sizeof buffer, text, a, b);
+    return buffer;
+}
+
+/// The reason to refuse the header, or empty when the content may be decoded.
+std::string check_header(const uint8_t* data, std::size_t size, HX_FILE_TYPE expected) {
+    if (size < kMagicSize) {
+        return is_prefix_of_magic(data, size)
+                   ? format("truncated (%llu bytes, the header alone takes %llu)", size,
+                            HX_FILE_IO::kHeaderSize)
+                   : "not a netlist database file";
+    }
+    const HX_FILE_TYPE kind = HX_FILE_IO::kind_of(data, size);
+    if (kind == HX_FILE_UNKNOWN) return "not a netlist database file";
+    if (kind != expected) {
+        return kind == HX_FILE_DESIGN ? "a design file, not a library file"
+                                      : "a library file, not a design file";
+    }
+    if (size < HX_FILE_IO::kHeaderSize) {
+        return format("truncated (%llu bytes, the header alone takes %llu)", size,
+                      HX_FILE_IO::kHeaderSize);
+    }
+    const uint64_t body = header_u64(data + 16);
+    const std::size_t have = size - HX_FILE_IO::kHeaderSize;
+    if (body > have) {
+        return format("truncated (%llu of %llu bytes)", size,
+                      body > UINT64_MAX - HX_FILE_IO::kHeaderSize ? UINT64_MAX
+                                                                  : body + HX_FILE_IO::kHeaderSize);
+    }
+    if (body < have) {
+        return format("corrupt (%llu bytes, the header announces %llu)", size,
+                      body + HX_FILE_IO::kHeaderSize);
+    }
+    if (HX_FILE_IO::checksum(data + kChecksumEnd, size - kChecksumEnd) != header_u32(data + 8)) {
+        return "corrupt (checksum mismatch)";
+    }
+    const uint32_t version = header_u32(data + 12);
+    if (version > HX_FILE_IO::kFormatVersion) {
+        return format("written by a newer version (format %llu, this version reads format %llu)",
+                      version, HX_FILE_IO::kFormatVersion);
+    }
+    if (version == 0 || header_u64(data + 24) != 0) return "corrupt (bad header)";
+    return {};
+}
+
+}  // namespace
+
+HX_FILE_TYPE HX_FILE_IO::kind_of(const void* data, std::size_t size) {
+    if (size < kMagicSize) return HX_FILE_UNKNOWN;
+    if (std::memcmp(data, kDesignMagic, kMagicSize) == 0) return HX_FILE_DESIGN;
+    if (std::memcmp(data, kLibraryMagic, kMagicSize) == 0) return HX_FILE_LIBRARY;
+    return HX_FILE_UNKNOWN;
+}
+
+std::unique_ptr<HX_LIBRARY> HX_FILE_IO::decode(const void* data, std::size_t size,
+                                               HX_FILE_TYPE expected, std::string& reason) {
+    const auto* bytes = static_cast<const uint8_t*>(data);
+    reason = check_header(bytes, size, expected);
+    if (!reason.empty()) return nullptr;
+    Decoder decoder(bytes + kHeaderSize, size - kHeaderSize);
+    try {
+        return expected == HX_FILE_DESIGN ? decoder.design_file() : decoder.library_file();
+    } catch (const Corrupt& refusal) {
+        reason = std::string("corrupt (") + refusal.what + ")";
+    }
+    return nullptr;
+}
+
+// --- files -----------------------------------------------------------------------
+//
+// get_file_type reads the magic, and the file object cannot seek back. The
+// bytes it took are kept, per file object, for the read that follows; the
+// read tells from the number of bytes left whether they were taken.
+
+namespace {
+
+struct TakenBytes {
+    const UT_PTRFILE* file = nullptr;
+    uint8_t bytes[kMagicSize] = {};
+    std::size_t count = 0;
+};
+
+constexpr std::size_t kMaxTaken = 16;
+std::mutex taken_mutex;
+std::vector<TakenBytes> taken_list;
+
+void remember_taken(const TakenBytes& taken) {
+    std::lock_guard<std::mutex> lock(taken_mutex);
+    std::erase_if(taken_list, [&](const TakenBytes& t) { return t.file == taken.file; });
+    if (taken_list.size() == kMaxTaken) taken_list.erase(taken_list.begin());
+    taken_list.push_back(taken);
+}
+
+TakenBytes recall_taken(const UT_PTRFILE* file) {
+    std::lock_guard<std::mutex> lock(taken_mutex);
+    auto it = std::find_if(taken_list.begin(), taken_list.end(),
+                           [&](const TakenBytes& t) { return t.file == file; });
+    if (it == taken_list.end()) return {};
+    TakenBytes taken = *it;
+    taken_list.erase(it);
+    return taken;
+}
+
+bool readable(const UT_PTRFILE* file) {
+    return file != nullptr && file->is_open() && file->access() == Port::ACCESS_READ;
+}
+
+/// The whole file, whether or not get_file_type took its first bytes.
+bool read_all(UT_PTRFILE* file, std::unique_ptr<uint8_t[]>& buffer, const uint8_t*& data,
+              std::size_t& size) {
+    const TakenBytes taken = recall_taken(file);
+    size = static_cast<std::size_t>(file->size());
+    buffer.reset(new uint8_t[size + kMagicSize]);
+    uint8_t* rest = buffer.get() + taken.count;
+    const std::size_t got = file->read(rest, size);
+    if (got == size) {
+        data = rest;
+        return true;
+    }
+    if (got + taken.count != size) return false;
+    std::memcpy(buffer.get(), taken.bytes, taken.count);
+    data = buffer.get();
+    return true;
+}
+
+}  // namespace
+
+HX_FILE_TYPE HX_FILE_IO::peek_type(UT_PTRFILE* file) {
+    if (!readable(file)) return HX_FILE_UNKNOWN;
+    TakenBytes taken;
+    taken.file = file;
+    taken.count = file->read(taken.bytes, kMagicSize);
+    if (taken.count > 0) remember_taken(taken);
+    return kind_of(taken.bytes, taken.count);
+}
+
+std::unique_ptr<HX_LIBRARY> HX_FILE_IO::read(UT_PTRFILE* file, HX_FILE_TYPE expected, bool quiet) {
+    std::string reason;
+    std::unique_ptr<HX_LIBRARY> library;
+    if (!readable(file)) {
+        reason = "not open for reading";
+    } else {
+        std::unique_ptr<uint8_t[]> buffer;
+        const uint8_t* data = nullptr;
+        std::size_t size = 0;
+        try {
+            if (read_all(file, buffer, data, size)) {
+                library = decode(data, size, expected, reason);
+            } else {
+                reason = "could not be read completely";
+            }
+        } catch (const std::bad_alloc&) {
+            reason = "too large to load";
+        }
+    }
+    if (library == nullptr && !quiet) {
+        PORT_MSG("HX", kRevision)
+            .issueError("cannot read database file '%s': %s\n", file ? file->name() : "",
+                        reason.c_str());
+    }
+    return library;
+}
+
+bool HX_FILE_IO::write(UT_PTRFILE* file, const std::string& bytes) {
+    constexpr std::size_t kBlock = std::size_t{1} << 20;
+    if (file == nullptr || !file->is_open() || file->access() != Port::ACCESS_WRITE) return false;
+    for (std::size_t at = 0; at < bytes.size(); at += kBlock) {
+        if (!file->write(bytes.data() + at, std::min(kBlock, bytes.size() - at))) break;
+    }
+    if (!file->failed()) return true;
+    file->fail();
+    return false;
+}
+
+// --- the environment's file operations ----------------------------------------
+
+namespace {
+
+bool report_write(UT_PTRFILE* file, bool written) {
+    if (!written) {
+        PORT_MSG("HX", kRevision)
+            .issueError("cannot write database file '%s'\n", file ? file->name() : "");
+    }
+    return written;
+}
+
+}  // namespace
+
+HX_FILE_TYPE HX_ENVIRONMENT::get_file_type(UT_PTRFILE* file) {
+    return HX_FILE_IO::peek_type(file);
+}
+
+HX_DESIGN* HX_ENVIRONMENT::create_design(UT_PTRFILE* file, uint8_t quiet) {
+    std::unique_ptr<HX_LIBRARY> library = HX_FILE_IO::read(file, HX_FILE_DESIGN, quiet != 0);
+    if (library == nullptr) return nullptr;
+    auto* links = library->create_liblink_iter();
+    HX_DESIGN* design = links->l_next()->get_design();
+    library->delete_liblink_iter(links);
+    adopt(std::move(library));
+    return design;
+}
+
+HX_LIBRARY* HX_ENVIRONMENT::create_library(UT_PTRFILE* file) {
+    std::unique_ptr<HX_LIBRARY> library = HX_FILE_IO::read(file, HX_FILE_LIBRARY, false);
+    return library ? adopt(std::move(library)) : nullptr;
+}
+
+bool HX_ENVIRONMENT::write_design(UT_PTRFILE* file, HX_DESIGN* design) {
+    if (design == nullptr) {
+        if (file != nullptr) file->fail();
+        return report_write(file, false);
+    }
+    return report_write(file, HX_FILE_IO::write(file, HX_FILE_IO::encode(*design)));
+}
+
+bool HX_ENVIRONMENT::write_library(UT_PTRFILE* file, HX_LIBRARY* library) {
+    if (library == nullptr) {
+        if (file != nullptr) file->fail();
+        return report_write(file, false);
+    }
+    return report_write(file, HX_FILE_IO::write(file, HX_FILE_IO::encode(*library)));
+}
