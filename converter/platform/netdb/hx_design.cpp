@@ -1,7 +1,10 @@
 #include "hx_design.h"
 
+#include <sys/mman.h>
+
 #include <algorithm>
 #include <cctype>
+#include <cstdlib>
 #include <cstring>
 #include <new>
 #include <string>
@@ -30,8 +33,8 @@ bool equal_ignore_case(const char* a, const char* b) {
 }
 
 // Rank of a signal for the highest-signal rule: lower is nearer the root.
-int signal_rank(const HX_SIGNAL* signal) {
-    return signal->is_global() ? -1 : signal->get_block()->get_depth();
+int64_t signal_rank(const HX_SIGNAL* signal) {
+    return signal->is_global() ? int64_t{-1} : int64_t{signal->get_block()->get_depth()};
 }
 
 }  // namespace
@@ -50,13 +53,31 @@ void* HX_ARENA::alloc(std::size_t size, std::size_t align) {
     return result;
 }
 
+namespace {
+constexpr std::size_t kHugePage = std::size_t{2} << 20;
+constexpr std::size_t kLargestChunk = std::size_t{4} << 20;
+}  // namespace
+
+HX_ARENA::~HX_ARENA() {
+    for (std::byte* chunk : chunks_) std::free(chunk);
+}
+
 void HX_ARENA::grow(std::size_t at_least) {
-    std::size_t size = std::max(next_chunk_, at_least);
-    chunks_.emplace_back(new std::byte[size]);
-    cur_ = chunks_.back().get();
+    const std::size_t size = std::max(next_chunk_, at_least);
+    void* chunk = nullptr;
+    if (size >= kHugePage && size % kHugePage == 0) {
+        chunk = std::aligned_alloc(kHugePage, size);
+#ifdef MADV_HUGEPAGE
+        if (chunk != nullptr) madvise(chunk, size, MADV_HUGEPAGE);
+#endif
+    }
+    if (chunk == nullptr) chunk = std::malloc(size);
+    if (chunk == nullptr) throw std::bad_alloc();
+    chunks_.push_back(static_cast<std::byte*>(chunk));
+    cur_ = chunks_.back();
     left_ = size;
     reserved_ += size;
-    next_chunk_ = std::min<std::size_t>(next_chunk_ * 2, std::size_t{1} << 20);
+    next_chunk_ = std::min(next_chunk_ * 2, kLargestChunk);
 }
 
 std::size_t HX_TAG_TABLE::home(uint32_t tag) const {
@@ -77,6 +98,7 @@ bool HX_TAG_TABLE::insert(HX_NETWORK* net) {
         if (slots_[i] == nullptr) {
             slots_[i] = net;
             ++used_;
+            max_tag_ = std::max(max_tag_, net->get_tag());
             return true;
         }
         if (slots_[i]->get_tag() == net->get_tag()) return false;
@@ -137,9 +159,15 @@ HX_MAPSIGNAL* HX_PIN::get_map_signal() const {
 
 // --- blocks ------------------------------------------------------------------
 
-HX_BLOCK::~HX_BLOCK() {
-    delete children_;
-    delete signals_;
+HX_BLOCK::~HX_BLOCK() { delete lists_; }
+
+HX_BLOCK_LISTS& HX_BLOCK::lists() {
+    if (lists_ == nullptr) {
+        const uint32_t depth = get_depth();
+        lists_ = new HX_BLOCK_LISTS;
+        lists_->depth = depth;
+    }
+    return *lists_;
 }
 
 HX_PRIMITIVE* HX_BLOCK::get_primitive() {
@@ -159,12 +187,6 @@ HX_BASEPHYSBLOCK* HX_BLOCK::get_phys_parent() const {
     if (map.empty()) return nullptr;
     auto it = map.find(this);
     return it == map.end() ? nullptr : it->second;
-}
-
-int HX_BLOCK::get_depth() const {
-    int depth = 0;
-    for (const HX_BLOCK* b = parent_; b != nullptr; b = b->parent_) ++depth;
-    return depth;
 }
 
 const char* HX_BLOCK::get_hiername() const {
@@ -219,18 +241,18 @@ bool HX_BLOCK::check_pins(uint8_t require_names) const {
 }
 
 bool HX_BLOCK::isempty() const {
-    if (children_ != nullptr && !children_->empty()) return false;
-    if (signals_ == nullptr) return true;
-    return std::all_of(signals_->begin(), signals_->end(),
+    if (lists_ == nullptr) return true;
+    if (!lists_->children.empty()) return false;
+    return std::all_of(lists_->signals.begin(), lists_->signals.end(),
                        [](const HX_SIGNAL* s) { return s == nullptr; });
 }
 
 UT_BLIST_ITER<HX_BLOCK>* HX_BLOCK::create_child_iter() const {
-    return new UT_BLIST_ITER<HX_BLOCK>(children_ ? *children_ : kNoBlocks);
+    return new UT_BLIST_ITER<HX_BLOCK>(lists_ ? lists_->children : kNoBlocks);
 }
 
 UT_BLISTS_ITER<HX_SIGNAL>* HX_BLOCK::create_signal_iter() const {
-    return new UT_BLISTS_ITER<HX_SIGNAL>(signals_ ? *signals_ : kNoSignals);
+    return new UT_BLISTS_ITER<HX_SIGNAL>(lists_ ? lists_->signals : kNoSignals);
 }
 
 UT_BLIST_ITER<HX_SIGNAL>* HX_BLOCK::create_global_siglist(uint8_t own_pins) const {
@@ -239,8 +261,8 @@ UT_BLIST_ITER<HX_SIGNAL>* HX_BLOCK::create_global_siglist(uint8_t own_pins) cons
     auto note = [&](HX_SIGNAL* s) {
         if (s != nullptr && s->is_global() && seen.insert(s).second) list.push_back(s);
     };
-    if (children_ != nullptr) {
-        for (const HX_BLOCK* child : *children_) {
+    if (lists_ != nullptr) {
+        for (const HX_BLOCK* child : lists_->children) {
             for (uint16_t i = 0; i < child->pin_count_; ++i) note(child->pins_[i].outer_);
         }
     }
@@ -385,8 +407,8 @@ HX_DESIGN::HX_DESIGN(HX_LIBRARY* library, const char* name)
 HX_DESIGN::~HX_DESIGN() {
     for (HX_BLOCK* block : blocks_) {
         for (uint16_t i = 0; i < block->pin_count_; ++i) block->pins_[i].~HX_PIN();
-        if (block->signals_ != nullptr) {
-            for (HX_SIGNAL* s : *block->signals_) {
+        if (block->lists_ != nullptr) {
+            for (HX_SIGNAL* s : block->lists_->signals) {
                 if (s != nullptr) s->~HX_SIGNAL();
             }
         }
@@ -436,10 +458,7 @@ T* HX_DESIGN::make_block(HX_BLOCK* parent, uint16_t pin_count, const char* name,
     block->pin_count_ = pin_count;
     block->pins_ = make_pins(block, pin_count);
     blocks_.push_back(block);
-    if (parent != nullptr) {
-        if (parent->children_ == nullptr) parent->children_ = new std::vector<HX_BLOCK*>;
-        parent->children_->push_back(block);
-    }
+    if (parent != nullptr) parent->lists().children.push_back(block);
     return block;
 }
 
@@ -534,23 +553,38 @@ UT_BLIST_ITER<HX_SIGNAL>* HX_DESIGN::create_global_iter() const {
 
 // --- the design: signals and networks ---------------------------------------
 
+HX_SIGNAL* HX_DESIGN::make_signal(const char* name) {
+    // The name goes right behind the signal: finding a signal by name then
+    // touches one place in memory, not two.
+    const std::size_t length = name && *name ? std::strlen(name) + 1 : 0;
+    auto* memory = static_cast<std::byte*>(
+        store_->objects.alloc(sizeof(HX_SIGNAL) + length, alignof(HX_SIGNAL)));
+    auto* signal = new (memory) HX_SIGNAL();
+    if (length > 0) {
+        char* text = reinterpret_cast<char*>(memory + sizeof(HX_SIGNAL));
+        std::memcpy(text, name, length);
+        signal->name_ = text;
+    } else {
+        signal->name_ = intern(name);
+    }
+    return signal;
+}
+
 HX_SIGNAL* HX_DESIGN::create_signal(HX_BLOCK* block, const char* name) {
     if (!owns(block)) return nullptr;
-    auto* signal = new (store_->objects.alloc(sizeof(HX_SIGNAL), alignof(HX_SIGNAL))) HX_SIGNAL();
+    HX_SIGNAL* signal = make_signal(name);
     signal->owner_ = reinterpret_cast<uintptr_t>(block);
-    signal->name_ = intern(name);
-    if (block->signals_ == nullptr) block->signals_ = new std::vector<HX_SIGNAL*>;
-    signal->slot_ = static_cast<uint32_t>(block->signals_->size());
-    block->signals_->push_back(signal);
+    std::vector<HX_SIGNAL*>& signals = block->lists().signals;
+    signal->slot_ = static_cast<uint32_t>(signals.size());
+    signals.push_back(signal);
     make_network(signal, next_tag());
     return signal;
 }
 
 HX_SIGNAL* HX_DESIGN::create_global_signal(const char* name) {
     if (name == nullptr || global_by_name_.contains(name)) return nullptr;
-    auto* signal = new (store_->objects.alloc(sizeof(HX_SIGNAL), alignof(HX_SIGNAL))) HX_SIGNAL();
+    HX_SIGNAL* signal = make_signal(name);
     signal->owner_ = reinterpret_cast<uintptr_t>(this) | 1;
-    signal->name_ = intern(name);
     signal->slot_ = static_cast<uint32_t>(globals_.size());
     globals_.push_back(signal);
     global_by_name_.emplace(signal->name_, signal);
@@ -572,9 +606,11 @@ void HX_DESIGN::rename_global(HX_SIGNAL* signal, const char* name) {
 }
 
 uint32_t HX_DESIGN::next_tag() {
-    do {
-        ++last_tag_;
-    } while (last_tag_ == 0 || store_->tags.find(last_tag_) != nullptr);
+    ++last_tag_;
+    // Tags are handed out in rising order, so a free one is found without a
+    // lookup until the numbers wrap or a file brought in larger tags.
+    if (last_tag_ != 0 && last_tag_ > store_->tags.max_tag()) return last_tag_;
+    while (last_tag_ == 0 || store_->tags.find(last_tag_) != nullptr) ++last_tag_;
     return last_tag_;
 }
 
@@ -606,6 +642,12 @@ void HX_DESIGN::join_networks(HX_NETWORK* a, HX_NETWORK* b) {
     HX_NETWORK* keep = a;
     HX_NETWORK* gone = b;
     if (signal_rank(b->highest_) < signal_rank(a->highest_)) std::swap(keep, gone);
+    // Walk the smaller ring: the larger one's object takes on the survivor's
+    // identity, so that joining nets one by one stays linear.
+    if (gone->members_ > keep->members_) {
+        exchange_identity(keep, gone);
+        std::swap(keep, gone);
+    }
     HX_SIGNAL* s = gone->last_member_;
     do {
         s = s->next_member_;
@@ -618,6 +660,19 @@ void HX_DESIGN::join_networks(HX_NETWORK* a, HX_NETWORK* b) {
     keep->members_ += gone->members_;
     keep->copy_properties(gone->get_props(), 0);
     drop_network(gone);
+}
+
+void HX_DESIGN::exchange_identity(HX_NETWORK* x, HX_NETWORK* y) {
+    store_->tags.erase(x->tag_);
+    store_->tags.erase(y->tag_);
+    std::swap(x->tag_, y->tag_);
+    std::swap(x->slot_, y->slot_);
+    std::swap(x->highest_, y->highest_);
+    std::swap(x->props_, y->props_);
+    networks_[x->slot_] = x;
+    networks_[y->slot_] = y;
+    store_->tags.insert(x);
+    store_->tags.insert(y);
 }
 
 void HX_DESIGN::drop_network(HX_NETWORK* net) {
@@ -729,7 +784,7 @@ void HX_DESIGN::delete_signal(HX_SIGNAL* signal) {
         for (std::size_t i = signal->slot_; i < globals_.size(); ++i)
             globals_[i]->slot_ = static_cast<uint32_t>(i);
     } else {
-        (*signal->get_block()->signals_)[signal->slot_] = nullptr;
+        signal->get_block()->lists_->signals[signal->slot_] = nullptr;
     }
     signal->~HX_SIGNAL();
 }

@@ -82,12 +82,19 @@ class HX_PIN : public HX_OBJECT {
 /// Pins of primitives are plain pins whose role and inversion flag matter.
 using HX_PIN_PRIMITIVE = HX_PIN;
 
+/// What a block holds beyond its pins: made when it gets its first child or
+/// signal, so primitives and other leaves never pay for it.
+struct HX_BLOCK_LISTS {
+    std::vector<HX_BLOCK*> children;
+    std::vector<HX_SIGNAL*> signals;  // holes where signals were deleted
+    uint32_t depth = 0;               // below the root
+};
+
 /// Common part of every block and primitive.
 ///
-/// Layout, 64 bytes: properties 8 | name 8 | design 8 | parent 8 | pins 8 |
-/// children 8 (list made on first child) | signals 8 (list made on first
-/// signal) | pin count u16 | kind flags u8 | user flag u8 | 4 bytes that a
-/// primitive's own fields reuse.
+/// Layout, 56 bytes: properties 8 | name 8 | design 8 | parent 8 | pins 8 |
+/// lists 8 (children, signals and depth, made on first use) | pin count u16 |
+/// kind flags u8 | user flag u8 | 4 bytes that a primitive's own fields reuse.
 class HX_BLOCK : public HX_OBJECT {
   public:
     uint16_t get_pin_count() const { return pin_count_; }
@@ -110,7 +117,10 @@ class HX_BLOCK : public HX_OBJECT {
     /// Logical blocks: the physical block this one maps into, or null.
     HX_BASEPHYSBLOCK* get_phys_parent() const;
     /// Depth below the root (the root is 0).
-    int get_depth() const;
+    uint32_t get_depth() const {
+        if (lists_ != nullptr) return lists_->depth;
+        return parent_ != nullptr ? parent_->lists_->depth + 1 : 0;
+    }
 
     /// Names from the root down to this block joined by "/"; empty when this
     /// block's own name is absent or empty. The text stays valid until the
@@ -126,7 +136,7 @@ class HX_BLOCK : public HX_OBJECT {
     /// No child blocks and no signals of its own.
     bool isempty() const;
 
-    size_t child_count() const { return children_ ? children_->size() : 0; }
+    size_t child_count() const { return lists_ ? lists_->children.size() : 0; }
     UT_BLIST_ITER<HX_BLOCK>* create_child_iter() const;
     void delete_child_iter(UT_BLIST_ITER<HX_BLOCK>* iter) const { delete iter; }
     /// The block's own signals in creation order.
@@ -146,12 +156,16 @@ class HX_BLOCK : public HX_OBJECT {
     friend class HX_DESIGN;
     friend class HX_FILE_IO;
 
+    HX_BLOCK_LISTS& lists();
+    const std::vector<HX_SIGNAL*>* signal_list() const {
+        return lists_ ? &lists_->signals : nullptr;
+    }
+
     const char* name_ = nullptr;
     HX_DESIGN* design_ = nullptr;
     HX_BLOCK* parent_ = nullptr;
     HX_PIN* pins_ = nullptr;
-    std::vector<HX_BLOCK*>* children_ = nullptr;
-    std::vector<HX_SIGNAL*>* signals_ = nullptr;
+    HX_BLOCK_LISTS* lists_ = nullptr;
     uint16_t pin_count_ = 0;
     uint8_t flags_ = 0;
     uint8_t user_ = 0;
@@ -484,6 +498,7 @@ class HX_DESIGN : public HX_OBJECT {
     T* make_block(HX_BLOCK* parent, uint16_t pin_count, const char* name, Args&&... args);
     HX_PIN* make_pins(HX_BLOCK* block, uint16_t count);
     void make_prim_pins(HX_BLOCK* block, HX_PRIMITIVE* prim);
+    HX_SIGNAL* make_signal(const char* name);
     HX_NETWORK* make_network(HX_SIGNAL* first, uint32_t tag);
     HX_CONN* make_conn(HX_PIN* pin);
     static void append_conn(HX_CONN*& last, HX_CONN* conn);
@@ -491,6 +506,7 @@ class HX_DESIGN : public HX_OBJECT {
     uint32_t next_tag();
     void register_tag(HX_NETWORK* net);
     void join_networks(HX_NETWORK* a, HX_NETWORK* b);
+    void exchange_identity(HX_NETWORK* x, HX_NETWORK* y);
     void drop_network(HX_NETWORK* net);
     void unlink_member(HX_SIGNAL* signal);
     void delete_signal(HX_SIGNAL* signal);

@@ -460,7 +460,7 @@ class HX_FILE_IO::Encoder {
         for (const HX_SIGNAL* global : design.globals_)
             add(global, 0);
         for (std::size_t b = 0; b < design.blocks_.size(); ++b) {
-            const std::vector<HX_SIGNAL*>* list = design.blocks_[b]->signals_;
+            const std::vector<HX_SIGNAL*>* list = design.blocks_[b]->signal_list();
             if (list == nullptr) continue;
             for (const HX_SIGNAL* signal : *list) {
                 if (signal != nullptr) add(signal, static_cast<uint32_t>(b + 1));

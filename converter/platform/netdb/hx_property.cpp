@@ -160,45 +160,74 @@ HX_PROPLIST::~HX_PROPLIST() {
     for (HX_PROPERTY* prop : items_) delete prop;
 }
 
-HX_PROPERTY* HX_PROPLIST::find(const char* name) const {
-    if (name == nullptr) return nullptr;
-    for (HX_PROPERTY* prop : items_) {
-        if (prop != nullptr && std::strcmp(prop->get_name(), name) == 0) return prop;
+namespace {
+// Lists longer than this are indexed by name.
+constexpr std::size_t kIndexedLength = 16;
+}  // namespace
+
+std::size_t HX_PROPLIST::slot_of(const char* name) const {
+    if (name == nullptr) return kNoSlot;
+    if (index_ != nullptr) {
+        auto it = index_->find(name);
+        return it == index_->end() ? kNoSlot : it->second;
     }
-    return nullptr;
+    for (std::size_t i = 0; i < items_.size(); ++i) {
+        if (items_[i] != nullptr && std::strcmp(items_[i]->get_name(), name) == 0) return i;
+    }
+    return kNoSlot;
+}
+
+HX_PROPERTY* HX_PROPLIST::find(const char* name) const {
+    const std::size_t slot = slot_of(name);
+    return slot == kNoSlot ? nullptr : items_[slot];
 }
 
 HX_PROPERTY* HX_PROPLIST::put(std::unique_ptr<HX_PROPERTY> prop) {
-    for (HX_PROPERTY*& slot : items_) {
-        if (slot != nullptr && std::strcmp(slot->get_name(), prop->get_name()) == 0) {
-            delete slot;
-            slot = prop.release();
-            return slot;
-        }
+    const std::size_t slot = slot_of(prop->get_name());
+    if (slot != kNoSlot) {
+        if (index_ != nullptr) index_->erase(items_[slot]->get_name());
+        delete items_[slot];
+        items_[slot] = prop.release();
+        if (index_ != nullptr) index_->emplace(items_[slot]->get_name(), slot);
+        return items_[slot];
     }
-    if (holes_ && iterators_ == 0) compact();
+    if (iterators_ == 0 && holes_ * 2 > items_.size()) compact();
     items_.push_back(prop.release());
     ++live_;
+    if (index_ != nullptr) {
+        index_->emplace(items_.back()->get_name(), items_.size() - 1);
+    } else if (items_.size() > kIndexedLength) {
+        build_index();
+    }
     return items_.back();
 }
 
 bool HX_PROPLIST::remove(const HX_PROPERTY* prop) {
-    auto it = std::find(items_.begin(), items_.end(), prop);
-    if (prop == nullptr || it == items_.end()) return false;
-    delete *it;
+    if (prop == nullptr) return false;
+    const std::size_t slot = slot_of(prop->get_name());
+    if (slot == kNoSlot || items_[slot] != prop) return false;
+    if (index_ != nullptr) index_->erase(prop->get_name());
+    delete items_[slot];
+    items_[slot] = nullptr;
     --live_;
-    if (iterators_ == 0) {
-        items_.erase(it);
-    } else {
-        *it = nullptr;
-        holes_ = true;
-    }
+    ++holes_;
+    // Compacting at most when half the list is holes keeps removal cheap.
+    if (iterators_ == 0 && holes_ * 2 > items_.size()) compact();
     return true;
 }
 
 void HX_PROPLIST::compact() {
     std::erase(items_, nullptr);
-    holes_ = false;
+    holes_ = 0;
+    if (index_ != nullptr) build_index();
+}
+
+void HX_PROPLIST::build_index() {
+    index_ = std::make_unique<std::unordered_map<std::string_view, std::size_t>>();
+    index_->reserve(items_.size());
+    for (std::size_t i = 0; i < items_.size(); ++i) {
+        if (items_[i] != nullptr) index_->emplace(items_[i]->get_name(), i);
+    }
 }
 
 UT_BLISTS_ITER<HX_PROPERTY>* HX_PROPLIST::create_iter() const {
@@ -209,7 +238,7 @@ UT_BLISTS_ITER<HX_PROPERTY>* HX_PROPLIST::create_iter() const {
 void HX_PROPLIST::delete_iter(UT_BLISTS_ITER<HX_PROPERTY>* iter) const {
     if (iter == nullptr) return;
     delete iter;
-    if (--iterators_ == 0 && holes_) const_cast<HX_PROPLIST*>(this)->compact();
+    if (--iterators_ == 0 && holes_ * 2 > items_.size()) const_cast<HX_PROPLIST*>(this)->compact();
 }
 
 // --- HX_OBJECT ---------------------------------------------------------------

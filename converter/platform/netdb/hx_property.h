@@ -10,6 +10,8 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <string_view>
+#include <unordered_map>
 #include <vector>
 
 #include "hx_types.h"
@@ -69,9 +71,10 @@ class HX_PROPERTY {
     HX_PROP_PINREF_DATA record_;  // timing kinds use its first three fields
 };
 
-/// The property list of one object. Deleting leaves a hole (null) while an
-/// iterator is out, so that a walk may delete the property it stands on;
-/// holes are compacted once no iterator is out.
+/// The property list of one object. Deleting leaves a hole (null), so that a
+/// walk may delete the property it stands on; holes are compacted once no
+/// iterator is out. Long lists keep an index by name, so that adding or
+/// finding a property never scans them.
 class HX_PROPLIST {
   public:
     HX_PROPLIST() = default;
@@ -91,12 +94,16 @@ class HX_PROPLIST {
     void delete_iter(UT_BLISTS_ITER<HX_PROPERTY>* iter) const;
 
   private:
+    static constexpr std::size_t kNoSlot = SIZE_MAX;
+    std::size_t slot_of(const char* name) const;
     void compact();
+    void build_index();
 
     std::vector<HX_PROPERTY*> items_;
+    std::unique_ptr<std::unordered_map<std::string_view, std::size_t>> index_;
     int live_ = 0;
     mutable int iterators_ = 0;
-    bool holes_ = false;
+    std::size_t holes_ = 0;
 };
 
 /// Base of every database object: its property list, made on first use.
@@ -142,6 +149,7 @@ class HX_OBJECT {
     void delete_prop_iter(UT_BLISTS_ITER<HX_PROPERTY>* iter) const;
 
   private:
+    friend class HX_DESIGN;  // exchanges the lists of two networks that join
     HX_PROPLIST& props();
     HX_PROPLIST* props_ = nullptr;
 };

@@ -13,17 +13,24 @@
 class HX_BLOCK;
 class HX_NETWORK;
 
-/// Bump allocator over chunks that grow from 4 KiB to 1 MiB. Nothing is
-/// freed before the arena itself; the owner runs destructors.
+/// Bump allocator over chunks that grow from 4 KiB to 4 MiB. Nothing is
+/// freed before the arena itself; the owner runs destructors. Large chunks
+/// are aligned for huge pages and offered to the system as such, which
+/// spares a large design hundreds of thousands of page faults.
 class HX_ARENA {
   public:
+    HX_ARENA() = default;
+    ~HX_ARENA();
+    HX_ARENA(const HX_ARENA&) = delete;
+    HX_ARENA& operator=(const HX_ARENA&) = delete;
+
     void* alloc(std::size_t size, std::size_t align);
     std::size_t bytes_reserved() const { return reserved_; }
 
   private:
     void grow(std::size_t at_least);
 
-    std::vector<std::unique_ptr<std::byte[]>> chunks_;
+    std::vector<std::byte*> chunks_;
     std::byte* cur_ = nullptr;
     std::size_t left_ = 0;
     std::size_t next_chunk_ = 4096;
@@ -39,6 +46,8 @@ class HX_TAG_TABLE {
     bool insert(HX_NETWORK* net);
     void erase(uint32_t tag);
     std::size_t size() const { return used_; }
+    /// The largest tag ever inserted.
+    uint32_t max_tag() const { return max_tag_; }
 
   private:
     std::size_t home(uint32_t tag) const;
@@ -46,6 +55,7 @@ class HX_TAG_TABLE {
 
     std::vector<HX_NETWORK*> slots_;
     std::size_t used_ = 0;
+    uint32_t max_tag_ = 0;
 };
 
 /// Index of a block's pin names, kept for blocks with many pins and dropped

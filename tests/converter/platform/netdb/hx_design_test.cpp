@@ -179,6 +179,41 @@ TEST_F(DesignTest, NetworksJoinThroughPinsAndKeepTheHighestSignalsTag) {
     EXPECT_EQ(drain(design->create_network_iter()), (std::vector<HX_NETWORK*>{net}));
 }
 
+// The lower net has more members than the upper one, so the joined network
+// is built from the lower one's ring but must still carry the upper one's
+// identity: tag, properties, highest signal and place in the network order.
+TEST_F(DesignTest, JoiningALargerLowerNetKeepsTheUpperNetsIdentity) {
+    HX_LOGBLOCK* top = design->create_logblock(nullptr, 0, "top");
+    HX_LOGBLOCK* u1 = design->create_logblock(top, 1, "u1");
+    HX_LOGBLOCK* u2 = design->create_logblock(u1, 1, "u2");
+    HX_SIGNAL* n = design->create_signal(top, "n");
+    HX_SIGNAL* other = design->create_signal(top, "other");
+    HX_SIGNAL* m = design->create_signal(u1, "m");
+    HX_SIGNAL* k = design->create_signal(u2, "k");
+    design->create_conn(k, u2, 0);
+    design->create_conn(m, u2, 0);
+    design->create_conn(m, u1, 0);
+    ASSERT_EQ(m->get_network()->get_member_count(), 2u);
+    n->get_network()->create_prop("SIDE", "upper", 1);
+    m->get_network()->create_prop("SIDE", "lower", 1);
+    const uint32_t tag_n = n->get_network()->get_tag();
+    const uint32_t tag_m = m->get_network()->get_tag();
+
+    design->create_conn(n, u1, 0);
+    HX_NETWORK* net = k->get_network();
+    EXPECT_EQ(n->get_network(), net);
+    EXPECT_EQ(m->get_network(), net);
+    EXPECT_EQ(net->get_tag(), tag_n);
+    EXPECT_EQ(net->get_highest_signal(), n);
+    EXPECT_EQ(net->get_member_count(), 3u);
+    EXPECT_STREQ(net->find_prop("SIDE")->get_text(), "upper");
+    EXPECT_EQ(hx_find_net_tag(design, tag_n), net);
+    EXPECT_EQ(hx_find_net_tag(design, tag_m), nullptr);
+    EXPECT_EQ(drain(design->create_network_iter()),
+              (std::vector<HX_NETWORK*>{net, other->get_network()}));
+    EXPECT_STREQ(net->get_name(), "top/n");
+}
+
 TEST_F(DesignTest, ConnectionsFollowTheHierarchyRules) {
     HX_LOGBLOCK* top = design->create_logblock(nullptr, 1, "top");
     HX_LOGBLOCK* u1 = design->create_logblock(top, 1, "u1");
