@@ -1,0 +1,455 @@
+// The scanner: cuts the input into tokens for the parser.
+//
+// A hand-written lexer: one switch on the class of the current byte, a NUL
+// sentinel behind the buffered bytes so that the inner loops need no bounds
+// check, and token texts handed out in place (the byte behind a token is held
+// aside and replaced by NUL until the next call). Nothing is allocated per
+// token; the buffer grows only while one token is longer than it.
+//
+// Tokens follow the longest match over these rules, the earlier rule winning a
+// tie: comment ("//" to the line end), blanks, separators, line feed, the ten
+// keywords, number, word, quoted string, any other byte. Hence keywords are
+// case-sensitive whole words, "//" starts a comment only where a token starts
+// (x//y is one word), and a digit run followed by a word byte is a word (12ab).
+// A quote with no closing quote matches none of them: it is copied to standard
+// output and scanning resumes right behind it.
+//
+// Input is read in blocks of up to 8192 bytes into a buffer of 16384 bytes.
+// A carriage return right before a line feed is dropped as the block arrives,
+// so CRLF files scan exactly like LF files.
+//
+// Choices where the format leaves the behaviour open:
+// - A digit run above INT32_MAX is a word (STRING) holding its digits.
+// - A NUL byte is reported as the parse error "invalid NUL byte in input" and
+//   skipped; it ends a word. A quoted string cannot hold a NUL, so a quote
+//   whose closing quote lies behind a NUL counts as unclosed. Inside a comment
+//   a NUL is comment text, like every other byte up to the line feed.
+// - A terminal is read in blocks like any other stream.
+// - The line feeds of a quoted string are counted before its length is
+//   checked: "maximum string length exceeded" shows the line of the closing
+//   quote.
+// - An over-long word is not kept in the buffer while it is matched (its text
+//   is dropped anyway), so only an unclosed quote or an over-long quoted string
+//   makes the buffer grow.
+// - The buffer is released at the end of input and when a new stream is set,
+//   and made afresh for the next read, so no memory is held between files.
+#include <array>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+
+#include "vrx_parser.h"
+#include "vrx_scan.h"
+
+namespace {
+
+void* realloc_block(void* block, std::size_t size) {
+    return std::realloc(block, size);
+}
+
+}  // namespace
+
+VX_TOKEN_VALUE token_value = {0, "", 0};
+VX_REALLOC_FN vrx_scan_realloc = realloc_block;
+
+namespace {
+
+enum ByteClass : unsigned char {
+    BC_NUL,        // the sentinel behind the data, or a NUL in the input
+    BC_BLANK,      // space, tab
+    BC_LINE_END,   // line feed
+    BC_QUOTE,      // "
+    BC_SEPARATOR,  // ( ) { } =
+    BC_DIGIT,      // 0-9
+    BC_WORD,       // every other byte; words are runs of BC_DIGIT and BC_WORD
+};
+
+constexpr std::array<unsigned char, 256> make_byte_classes() {
+    std::array<unsigned char, 256> classes{};
+    for (unsigned char& c : classes)
+        c = BC_WORD;
+    classes[0] = BC_NUL;
+    classes[' '] = classes['\t'] = BC_BLANK;
+    classes['\n'] = BC_LINE_END;
+    classes['"'] = BC_QUOTE;
+    for (unsigned char c : {'(', ')', '{', '}', '='})
+        classes[c] = BC_SEPARATOR;
+    for (unsigned char c = '0'; c <= '9'; ++c)
+        classes[c] = BC_DIGIT;
+    return classes;
+}
+
+constexpr std::array<unsigned char, 256> kByteClass = make_byte_classes();
+
+inline unsigned char byte_class(const char* p) {
+    return kByteClass[static_cast<unsigned char>(*p)];
+}
+
+inline bool is_space(const char* p) {
+    return byte_class(p) == BC_BLANK || byte_class(p) == BC_LINE_END;
+}
+
+inline bool in_word(const char* p) {
+    return byte_class(p) >= BC_DIGIT;
+}
+
+constexpr std::size_t kInitialSize = 16384;
+constexpr std::size_t kReadSize = 8192;
+
+struct Scanner {
+    std::FILE* input = nullptr;  // null: standard input
+    char* buf = nullptr;         // read-ahead buffer of `size` bytes, null when released
+    std::size_t size = 0;
+    char* cur = nullptr;      // next byte to scan
+    char* lim = nullptr;      // end of the buffered data; *lim is the NUL sentinel
+    char* hold_at = nullptr;  // the NUL that ends the current token's text
+    char hold_byte = 0;       // the byte it stands in for
+    bool cr_held = false;     // the last block ended in CR; the next may start with LF
+    bool stopped = false;     // a fatal stop happened: end of input until a new stream
+};
+
+Scanner sc;
+
+std::FILE* stream() {
+    return sc.input ? sc.input : stdin;
+}
+
+// --- Buffer ------------------------------------------------------------------
+
+void release_hold() {
+    if (sc.hold_at) *sc.hold_at = sc.hold_byte;
+    sc.hold_at = nullptr;
+}
+
+void hold(char* end) {
+    sc.hold_at = end;
+    sc.hold_byte = *end;
+    *end = '\0';
+}
+
+void discard_buffer() {
+    std::free(sc.buf);
+    sc = Scanner{sc.input, nullptr, 0, nullptr, nullptr, nullptr, 0, false, sc.stopped};
+}
+
+// The three stops the run cannot recover from. They bypass the message
+// manager and end the run through the host's exit handler; if that returns,
+// the scanner reports end of input until a new stream is set.
+void fatal_stop(const char* text) {
+    std::fputs(text, stderr);
+    std::fputc('\n', stderr);
+    std::fflush(stderr);
+    sc.stopped = true;
+    vrx_end_run();
+}
+
+bool create_buffer() {
+    char* block = static_cast<char*>(vrx_scan_realloc(nullptr, kInitialSize));
+    if (!block) {
+        fatal_stop("out of dynamic memory in yy_create_buffer()");
+        return false;
+    }
+    sc.buf = sc.cur = sc.lim = block;
+    sc.size = kInitialSize;
+    *sc.lim = '\0';
+    return true;
+}
+
+bool grow_buffer() {
+    char* block = static_cast<char*>(vrx_scan_realloc(sc.buf, sc.size * 2));
+    if (!block) {
+        fatal_stop("fatal error - scanner input buffer overflow");
+        return false;
+    }
+    sc.lim = block + (sc.lim - sc.buf);
+    sc.buf = block;
+    sc.size *= 2;
+    return true;
+}
+
+// Drops every CR that a LF follows in [p, p + n); returns the new length.
+std::size_t drop_cr_before_lf(char* p, std::size_t n) {
+    char* cr = static_cast<char*>(std::memchr(p, '\r', n));
+    if (!cr) return n;
+    const char* end = p + n;
+    char* out = cr;
+    for (const char* in = cr; in < end; ++in) {
+        if (*in == '\r' && in + 1 < end && in[1] == '\n') continue;
+        *out++ = *in;
+    }
+    return static_cast<std::size_t>(out - p);
+}
+
+// Reads the next block behind the buffered data. A CR at the block's end is
+// held back until the next block shows whether a LF follows it. Returns the
+// bytes added: 0 at the end of input or after a fatal stop.
+std::size_t read_block() {
+    for (;;) {
+        const std::size_t held = sc.cr_held ? 1 : 0;
+        std::size_t room = sc.size - static_cast<std::size_t>(sc.lim - sc.buf) - 1 - held;
+        if (room == 0) {
+            if (!grow_buffer()) return 0;
+            continue;
+        }
+        const std::size_t want = room < kReadSize ? room : kReadSize;
+        char* dst = sc.lim;
+        if (held) *dst = '\r';
+        const std::size_t got = std::fread(dst + held, 1, want, stream());
+        if (got < want && std::ferror(stream())) {
+            fatal_stop("input in flex scanner failed");
+            return 0;
+        }
+        std::size_t n = held + got;
+        sc.cr_held = got == want && dst[n - 1] == '\r';
+        if (sc.cr_held) --n;
+        n = drop_cr_before_lf(dst, n);
+        sc.lim = dst + n;
+        *sc.lim = '\0';
+        if (n > 0 || !sc.cr_held) return n;
+    }
+}
+
+// Moves the bytes from `keep` on (the part of a token matched so far) to the
+// front of the buffer and reads the next block behind them. `keep` follows the
+// move; other pointers into the buffer must be re-derived from it. Returns the
+// bytes added: 0 at the end of input or after a fatal stop.
+std::size_t refill(char*& keep) {
+    if (sc.stopped) return 0;
+    const std::size_t kept = static_cast<std::size_t>(sc.lim - keep);
+    if (keep != sc.buf) std::memmove(sc.buf, keep, kept);
+    sc.lim = sc.buf + kept;
+    const std::size_t added = read_block();
+    keep = sc.buf;
+    return added;
+}
+
+// --- Tokens ------------------------------------------------------------------
+
+VX_TOKEN separator_token(char c) {
+    switch (c) {
+        case '(':
+            return VX_TOK_LPAREN;
+        case ')':
+            return VX_TOK_RPAREN;
+        case '{':
+            return VX_TOK_LBRACE;
+        case '}':
+            return VX_TOK_RBRACE;
+        default:
+            return VX_TOK_EQUALS;
+    }
+}
+
+// The keyword spelled by [p, p + n), or VX_TOK_STRING.
+VX_TOKEN keyword(const char* p, std::size_t n) {
+    struct Keyword {
+        const char* text;
+        VX_TOKEN token;
+    };
+    static constexpr Keyword kKeywords[] = {
+        {"DESIGN", VX_TOK_DESIGN},       {"BLOCK", VX_TOK_BLOCK},
+        {"PHYSBLOCK", VX_TOK_PHYSBLOCK}, {"PRIM", VX_TOK_PRIM},
+        {"PHYSPRIM", VX_TOK_PHYSPRIM},   {"PIN", VX_TOK_PIN},
+        {"SIGNAL", VX_TOK_SIGNAL},       {"PHYSSIGNAL", VX_TOK_PHYSSIGNAL},
+        {"MAPSIGNAL", VX_TOK_MAPSIGNAL}, {"MAPCONN", VX_TOK_MAPCONN},
+    };
+    if (n < 3 || n > 10 || p[0] < 'B' || p[0] > 'S') return VX_TOK_STRING;
+    for (const Keyword& k : kKeywords) {
+        if (std::strlen(k.text) == n && std::memcmp(k.text, p, n) == 0) return k.token;
+    }
+    return VX_TOK_STRING;
+}
+
+VX_TOKEN string_token(char* text, std::size_t length) {
+    hold(text + length);
+    token_value.text = text;
+    token_value.length = length;
+    return VX_TOK_STRING;
+}
+
+VX_TOKEN too_long() {
+    vrx_parse_error("maximum string length exceeded");
+    token_value.text = "";
+    token_value.length = 0;
+    return VX_TOK_STRING;
+}
+
+// A complete word [tok, end), of which `dropped` leading bytes are no longer
+// in the buffer.
+VX_TOKEN word_token(char* tok, char* end, std::size_t dropped) {
+    if (sc.stopped) return VX_TOK_END;
+    const std::size_t length = dropped + static_cast<std::size_t>(end - tok);
+    if (length > VX_MAX_TEXT) return too_long();
+    const VX_TOKEN kw = keyword(tok, length);
+    if (kw != VX_TOK_STRING) return kw;
+    return string_token(tok, length);
+}
+
+// Matches the rest of a word from `p` on; [tok, p) is matched already.
+VX_TOKEN scan_word(char* tok, char* p) {
+    std::size_t dropped = 0;
+    for (;;) {
+        while (in_word(p))
+            ++p;
+        if (p != sc.lim) break;
+        std::size_t matched = static_cast<std::size_t>(p - tok);
+        if (matched > VX_MAX_TEXT) {  // its text is lost anyway: keep none of it
+            dropped += matched;
+            tok = p;
+            matched = 0;
+        }
+        const bool more = refill(tok) > 0;
+        p = tok + matched;
+        if (!more) break;
+    }
+    sc.cur = p;
+    return word_token(tok, p, dropped);
+}
+
+// [p, end) holds digits only. False when the value is above INT32_MAX.
+bool decimal_value(const char* p, const char* end, int32_t& value) {
+    int64_t v = 0;
+    for (; p < end; ++p) {
+        v = v * 10 + (*p - '0');
+        if (v > INT32_MAX) return false;
+    }
+    value = static_cast<int32_t>(v);
+    return true;
+}
+
+VX_TOKEN scan_number(char* tok) {
+    char* p = tok;
+    for (;;) {
+        while (byte_class(p) == BC_DIGIT)
+            ++p;
+        if (p != sc.lim) break;
+        const std::size_t matched = static_cast<std::size_t>(p - tok);
+        if (matched > VX_MAX_TEXT) return scan_word(tok, p);  // a STRING whatever follows
+        const bool more = refill(tok) > 0;
+        p = tok + matched;
+        if (!more) break;
+    }
+    if (byte_class(p) == BC_WORD) return scan_word(tok, p);
+    sc.cur = p;
+    if (!decimal_value(tok, p, token_value.number)) return word_token(tok, p, 0);
+    return VX_TOK_NUMBER;
+}
+
+int32_t count_line_ends(const char* p, const char* end) {
+    int32_t lines = 0;
+    for (; p < end; ++p)
+        lines += *p == '\n';
+    return lines;
+}
+
+// A quote at `tok`. True with a STRING token when the quote is closed; false
+// after rule 9 when it is not: the quote goes to standard output and scanning
+// resumes right behind it.
+bool scan_quoted(char* tok) {
+    char* p = tok + 1;
+    for (;;) {
+        while (*p != '"' && *p != '\0')
+            ++p;
+        if (*p == '"') break;
+        const std::size_t matched = static_cast<std::size_t>(p - tok);
+        if (p != sc.lim || refill(tok) == 0) {
+            if (sc.stopped) return false;
+            std::fputc('"', stdout);
+            sc.cur = tok + 1;
+            return false;
+        }
+        p = tok + matched;
+    }
+    line_number += count_line_ends(tok + 1, p);
+    sc.cur = p + 1;
+    if (static_cast<std::size_t>(p + 1 - tok) > VX_MAX_TEXT) {
+        too_long();
+    } else {
+        string_token(tok + 1, static_cast<std::size_t>(p - tok - 1));
+    }
+    return true;
+}
+
+// At a "/": true when a second "/" follows. `p` follows a refill.
+bool starts_comment(char*& p) {
+    if (p + 1 == sc.lim) refill(p);
+    return p[1] == '/';
+}
+
+// Skips to the line feed that ends the comment (not part of it) or to the end of input.
+void skip_comment(char* p) {
+    for (;;) {
+        const auto rest = static_cast<std::size_t>(sc.lim - p);
+        if (char* lf = static_cast<char*>(std::memchr(p, '\n', rest))) {
+            sc.cur = lf;
+            return;
+        }
+        p = sc.lim;
+        if (refill(p) == 0) {
+            sc.cur = p;
+            return;
+        }
+    }
+}
+
+// Blanks and line feeds; the one place where line feeds between tokens are counted.
+char* skip_space(char* p) {
+    do {
+        line_number += *p == '\n';
+        ++p;
+    } while (is_space(p));
+    return p;
+}
+
+}  // namespace
+
+void vrx_set_input(std::FILE* stream) {
+    discard_buffer();
+    sc.input = stream;
+    sc.stopped = false;
+}
+
+VX_TOKEN vrx_next_token() {
+    release_hold();
+    if (sc.stopped) {
+        discard_buffer();
+        return VX_TOK_END;
+    }
+    if (!sc.buf && !create_buffer()) return VX_TOK_END;
+    for (;;) {
+        char* p = sc.cur;
+        switch (byte_class(p)) {
+            case BC_BLANK:
+            case BC_LINE_END:
+                sc.cur = skip_space(p);
+                break;
+            case BC_SEPARATOR:
+                sc.cur = p + 1;
+                return separator_token(*p);
+            case BC_DIGIT:
+                return scan_number(p);
+            case BC_WORD:
+                if (*p == '/' && starts_comment(p)) {
+                    skip_comment(p);
+                    break;
+                }
+                return scan_word(p, p + 1);
+            case BC_QUOTE:
+                if (scan_quoted(p)) return VX_TOK_STRING;
+                if (sc.stopped) return VX_TOK_END;
+                break;
+            case BC_NUL:
+                if (p != sc.lim) {
+                    sc.cur = p + 1;
+                    vrx_parse_error("invalid NUL byte in input");
+                    if (vrx_run_ended()) return VX_TOK_END;
+                } else if (refill(p) > 0) {
+                    sc.cur = p;
+                } else {
+                    discard_buffer();
+                    return VX_TOK_END;
+                }
+                break;
+        }
+    }
+}
