@@ -21,8 +21,6 @@ constexpr const char* kSourceFile = "../s/vrx";
 constexpr const char* kRevision = "$Revision: 1.3 $";
 constexpr int32_t kMaxErrors = 20;
 
-bool run_ended = false;
-
 // The whole text, however long: builder messages carry names of up to 1024
 // bytes and more besides.
 std::string numbered(const char* text) {
@@ -51,15 +49,13 @@ void vrx_parse_warning(const char* text) {
     Port_CLocWarningFn(where, numbered(text).c_str());
 }
 
+bool vrx_run_end_flag = false;
+
 void vrx_end_run() {
     Port_MsgDispatcher::exit(2);
-    run_ended = true;
-}
-
-bool vrx_run_ended() {
-    return run_ended;
+    vrx_run_end_flag = true;
 }
 
 void vrx_clear_run_ended() {
-    run_ended = false;
+    vrx_run_end_flag = false;
 }

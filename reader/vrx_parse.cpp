@@ -87,6 +87,19 @@ bool is_signal_kw(VX_TOKEN t) {
     return t == VX_TOK_SIGNAL || t == VX_TOK_PHYSSIGNAL;
 }
 
+// The STRING token's text into a name buffer. Most names are short: one
+// fixed-size block copy, then the terminator.
+void copy_text(char* out) {
+    static_assert(VX_TEXT_BLOCK <= VX_MAX_TEXT + 1);
+    const std::size_t length = token_value.length;
+    if (length < VX_TEXT_BLOCK) {
+        std::memcpy(out, token_value.text, VX_TEXT_BLOCK);
+    } else {
+        std::memcpy(out, token_value.text, length);
+    }
+    out[length] = '\0';
+}
+
 // "%d" of a value from 0 to INT32_MAX.
 void format_decimal(int32_t value, char* out) {
     char digits[16];
@@ -160,7 +173,7 @@ void Parser::take_name(char* out) {
     if (lookahead_ == VX_TOK_NUMBER) {
         format_decimal(token_value.number, out);
     } else {
-        std::memcpy(out, token_value.text, token_value.length + 1);
+        copy_text(out);
     }
     shift();
 }

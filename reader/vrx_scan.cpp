@@ -15,8 +15,9 @@
 // output and scanning resumes right behind it.
 //
 // Input is read in blocks of up to 8192 bytes into a buffer of 16384 bytes.
-// A carriage return right before a line feed is dropped as the block arrives,
-// so CRLF files scan exactly like LF files.
+// A carriage return right before a line feed is dropped, so CRLF files scan
+// exactly like LF files: it ends a word or number and is skipped with the line
+// feed, and a quoted string's text loses it. Any other CR is a word byte.
 //
 // Choices where the format leaves the behaviour open:
 // - A digit run above INT32_MAX is a word (STRING) holding its digits.
@@ -58,6 +59,7 @@ enum ByteClass : unsigned char {
     BC_NUL,        // the sentinel behind the data, or a NUL in the input
     BC_BLANK,      // space, tab
     BC_LINE_END,   // line feed
+    BC_CR,         // carriage return: a line end before a line feed, else a word byte
     BC_QUOTE,      // "
     BC_SEPARATOR,  // ( ) { } =
     BC_DIGIT,      // 0-9
@@ -71,6 +73,7 @@ constexpr std::array<unsigned char, 256> make_byte_classes() {
     classes[0] = BC_NUL;
     classes[' '] = classes['\t'] = BC_BLANK;
     classes['\n'] = BC_LINE_END;
+    classes['\r'] = BC_CR;
     classes['"'] = BC_QUOTE;
     for (unsigned char c : {'(', ')', '{', '}', '='})
         classes[c] = BC_SEPARATOR;
@@ -85,15 +88,14 @@ inline unsigned char byte_class(const char* p) {
     return kByteClass[static_cast<unsigned char>(*p)];
 }
 
-inline bool is_space(const char* p) {
-    return byte_class(p) == BC_BLANK || byte_class(p) == BC_LINE_END;
-}
-
 inline bool in_word(const char* p) {
     return byte_class(p) >= BC_DIGIT;
 }
 
 constexpr std::size_t kInitialSize = 16384;
+// Bytes allocated behind the buffer so that a token's text can be read in
+// whole blocks of VX_TEXT_BLOCK bytes (see vrx_scan.h).
+constexpr std::size_t kSlack = VX_TEXT_BLOCK;
 constexpr std::size_t kReadSize = 8192;
 
 struct Scanner {
@@ -104,7 +106,6 @@ struct Scanner {
     char* lim = nullptr;      // end of the buffered data; *lim is the NUL sentinel
     char* hold_at = nullptr;  // the NUL that ends the current token's text
     char hold_byte = 0;       // the byte it stands in for
-    bool cr_held = false;     // the last block ended in CR; the next may start with LF
     bool stopped = false;     // a fatal stop happened: end of input until a new stream
 };
 
@@ -129,7 +130,7 @@ void hold(char* end) {
 
 void discard_buffer() {
     std::free(sc.buf);
-    sc = Scanner{sc.input, nullptr, 0, nullptr, nullptr, nullptr, 0, false, sc.stopped};
+    sc = Scanner{sc.input, nullptr, 0, nullptr, nullptr, nullptr, 0, sc.stopped};
 }
 
 // The three stops the run cannot recover from. They bypass the message
@@ -144,7 +145,7 @@ void fatal_stop(const char* text) {
 }
 
 bool create_buffer() {
-    char* block = static_cast<char*>(vrx_scan_realloc(nullptr, kInitialSize));
+    char* block = static_cast<char*>(vrx_scan_realloc(nullptr, kInitialSize + kSlack));
     if (!block) {
         fatal_stop("out of dynamic memory in yy_create_buffer()");
         return false;
@@ -156,7 +157,7 @@ bool create_buffer() {
 }
 
 bool grow_buffer() {
-    char* block = static_cast<char*>(vrx_scan_realloc(sc.buf, sc.size * 2));
+    char* block = static_cast<char*>(vrx_scan_realloc(sc.buf, sc.size * 2 + kSlack));
     if (!block) {
         fatal_stop("fatal error - scanner input buffer overflow");
         return false;
@@ -167,46 +168,23 @@ bool grow_buffer() {
     return true;
 }
 
-// Drops every CR that a LF follows in [p, p + n); returns the new length.
-std::size_t drop_cr_before_lf(char* p, std::size_t n) {
-    char* cr = static_cast<char*>(std::memchr(p, '\r', n));
-    if (!cr) return n;
-    const char* end = p + n;
-    char* out = cr;
-    for (const char* in = cr; in < end; ++in) {
-        if (*in == '\r' && in + 1 < end && in[1] == '\n') continue;
-        *out++ = *in;
-    }
-    return static_cast<std::size_t>(out - p);
-}
-
-// Reads the next block behind the buffered data. A CR at the block's end is
-// held back until the next block shows whether a LF follows it. Returns the
-// bytes added: 0 at the end of input or after a fatal stop.
+// Reads the next block behind the buffered data. Returns the bytes added: 0
+// at the end of input or after a fatal stop.
 std::size_t read_block() {
-    for (;;) {
-        const std::size_t held = sc.cr_held ? 1 : 0;
-        std::size_t room = sc.size - static_cast<std::size_t>(sc.lim - sc.buf) - 1 - held;
-        if (room == 0) {
-            if (!grow_buffer()) return 0;
-            continue;
-        }
-        const std::size_t want = room < kReadSize ? room : kReadSize;
-        char* dst = sc.lim;
-        if (held) *dst = '\r';
-        const std::size_t got = std::fread(dst + held, 1, want, stream());
-        if (got < want && std::ferror(stream())) {
-            fatal_stop("input in flex scanner failed");
-            return 0;
-        }
-        std::size_t n = held + got;
-        sc.cr_held = got == want && dst[n - 1] == '\r';
-        if (sc.cr_held) --n;
-        n = drop_cr_before_lf(dst, n);
-        sc.lim = dst + n;
-        *sc.lim = '\0';
-        if (n > 0 || !sc.cr_held) return n;
+    std::size_t room = sc.size - static_cast<std::size_t>(sc.lim - sc.buf) - 1;
+    while (room == 0) {
+        if (!grow_buffer()) return 0;
+        room = sc.size - static_cast<std::size_t>(sc.lim - sc.buf) - 1;
     }
+    const std::size_t want = room < kReadSize ? room : kReadSize;
+    const std::size_t got = std::fread(sc.lim, 1, want, stream());
+    if (got < want && std::ferror(stream())) {
+        fatal_stop("input in flex scanner failed");
+        return 0;
+    }
+    sc.lim += got;
+    *sc.lim = '\0';
+    return got;
 }
 
 // Moves the bytes from `keep` on (the part of a token matched so far) to the
@@ -225,6 +203,18 @@ std::size_t refill(char*& keep) {
 
 // --- Tokens ------------------------------------------------------------------
 
+// At a CR at `p`: true when a line feed follows, which makes the CR part of
+// the line end: it is skipped and never part of a token. Refills, keeping the
+// bytes from `keep` on, when the CR is the last byte buffered; `p` follows.
+bool crlf_at(char*& keep, char*& p) {
+    if (p + 1 == sc.lim) {
+        const auto offset = p - keep;
+        refill(keep);
+        p = keep + offset;
+    }
+    return p[1] == '\n';
+}
+
 VX_TOKEN separator_token(char c) {
     switch (c) {
         case '(':
@@ -240,24 +230,35 @@ VX_TOKEN separator_token(char c) {
     }
 }
 
+template <std::size_t N>
+bool spells(const char* p, const char (&word)[N]) {
+    return std::memcmp(p, word, N - 1) == 0;
+}
+
 // The keyword spelled by [p, p + n), or VX_TOK_STRING.
 VX_TOKEN keyword(const char* p, std::size_t n) {
-    struct Keyword {
-        const char* text;
-        VX_TOKEN token;
-    };
-    static constexpr Keyword kKeywords[] = {
-        {"DESIGN", VX_TOK_DESIGN},       {"BLOCK", VX_TOK_BLOCK},
-        {"PHYSBLOCK", VX_TOK_PHYSBLOCK}, {"PRIM", VX_TOK_PRIM},
-        {"PHYSPRIM", VX_TOK_PHYSPRIM},   {"PIN", VX_TOK_PIN},
-        {"SIGNAL", VX_TOK_SIGNAL},       {"PHYSSIGNAL", VX_TOK_PHYSSIGNAL},
-        {"MAPSIGNAL", VX_TOK_MAPSIGNAL}, {"MAPCONN", VX_TOK_MAPCONN},
-    };
-    if (n < 3 || n > 10 || p[0] < 'B' || p[0] > 'S') return VX_TOK_STRING;
-    for (const Keyword& k : kKeywords) {
-        if (std::strlen(k.text) == n && std::memcmp(k.text, p, n) == 0) return k.token;
+    switch (n) {
+        case 3:
+            return spells(p, "PIN") ? VX_TOK_PIN : VX_TOK_STRING;
+        case 4:
+            return spells(p, "PRIM") ? VX_TOK_PRIM : VX_TOK_STRING;
+        case 5:
+            return spells(p, "BLOCK") ? VX_TOK_BLOCK : VX_TOK_STRING;
+        case 6:
+            if (spells(p, "DESIGN")) return VX_TOK_DESIGN;
+            return spells(p, "SIGNAL") ? VX_TOK_SIGNAL : VX_TOK_STRING;
+        case 7:
+            return spells(p, "MAPCONN") ? VX_TOK_MAPCONN : VX_TOK_STRING;
+        case 8:
+            return spells(p, "PHYSPRIM") ? VX_TOK_PHYSPRIM : VX_TOK_STRING;
+        case 9:
+            if (spells(p, "PHYSBLOCK")) return VX_TOK_PHYSBLOCK;
+            return spells(p, "MAPSIGNAL") ? VX_TOK_MAPSIGNAL : VX_TOK_STRING;
+        case 10:
+            return spells(p, "PHYSSIGNAL") ? VX_TOK_PHYSSIGNAL : VX_TOK_STRING;
+        default:
+            return VX_TOK_STRING;
     }
-    return VX_TOK_STRING;
 }
 
 VX_TOKEN string_token(char* text, std::size_t length) {
@@ -268,8 +269,9 @@ VX_TOKEN string_token(char* text, std::size_t length) {
 }
 
 VX_TOKEN too_long() {
+    static const char kEmpty[VX_TEXT_BLOCK] = {};
     vrx_parse_error("maximum string length exceeded");
-    token_value.text = "";
+    token_value.text = kEmpty;
     token_value.length = 0;
     return VX_TOK_STRING;
 }
@@ -285,12 +287,26 @@ VX_TOKEN word_token(char* tok, char* end, std::size_t dropped) {
     return string_token(tok, length);
 }
 
+// The first byte from `p` on that is no word byte. Four at a time while it
+// can: the sentinel stops the run before the end of the buffered data.
+inline char* word_end(char* p) {
+    while (in_word(p) && in_word(p + 1) && in_word(p + 2) && in_word(p + 3))
+        p += 4;
+    while (in_word(p))
+        ++p;
+    return p;
+}
+
 // Matches the rest of a word from `p` on; [tok, p) is matched already.
 VX_TOKEN scan_word(char* tok, char* p) {
     std::size_t dropped = 0;
     for (;;) {
-        while (in_word(p))
-            ++p;
+        p = word_end(p);
+        if (*p == '\r') {
+            if (crlf_at(tok, p)) break;
+            ++p;  // a lone CR is a word byte
+            continue;
+        }
         if (p != sc.lim) break;
         std::size_t matched = static_cast<std::size_t>(p - tok);
         if (matched > VX_MAX_TEXT) {  // its text is lost anyway: keep none of it
@@ -329,10 +345,22 @@ VX_TOKEN scan_number(char* tok) {
         p = tok + matched;
         if (!more) break;
     }
-    if (byte_class(p) == BC_WORD) return scan_word(tok, p);
+    if (byte_class(p) == BC_WORD || (*p == '\r' && !crlf_at(tok, p))) {
+        return scan_word(tok, p);
+    }
     sc.cur = p;
     if (!decimal_value(tok, p, token_value.number)) return word_token(tok, p, 0);
     return VX_TOK_NUMBER;
+}
+
+// Drops each CR that a LF follows from [text, end); returns the new length.
+std::size_t drop_crs(char* text, const char* end) {
+    char* out = static_cast<char*>(std::memchr(text, '\r', static_cast<std::size_t>(end - text)));
+    if (!out) return static_cast<std::size_t>(end - text);
+    for (const char* in = out; in < end; ++in) {
+        if (*in != '\r' || in[1] != '\n') *out++ = *in;
+    }
+    return static_cast<std::size_t>(out - text);
 }
 
 int32_t count_line_ends(const char* p, const char* end) {
@@ -360,12 +388,14 @@ bool scan_quoted(char* tok) {
         }
         p = tok + matched;
     }
-    line_number += count_line_ends(tok + 1, p);
+    char* text = tok + 1;
+    const std::size_t length = drop_crs(text, p);
+    line_number += count_line_ends(text, text + length);
     sc.cur = p + 1;
-    if (static_cast<std::size_t>(p + 1 - tok) > VX_MAX_TEXT) {
+    if (length + 2 > VX_MAX_TEXT) {
         too_long();
     } else {
-        string_token(tok + 1, static_cast<std::size_t>(p - tok - 1));
+        string_token(text, length);
     }
     return true;
 }
@@ -392,13 +422,26 @@ void skip_comment(char* p) {
     }
 }
 
-// Blanks and line feeds; the one place where line feeds between tokens are counted.
+// Blanks and line ends; the one place where line ends between tokens are counted.
 char* skip_space(char* p) {
-    do {
-        line_number += *p == '\n';
-        ++p;
-    } while (is_space(p));
-    return p;
+    for (;;) {
+        switch (byte_class(p)) {
+            case BC_BLANK:
+                ++p;
+                break;
+            case BC_LINE_END:
+                ++line_number;
+                ++p;
+                break;
+            case BC_CR:
+                if (!crlf_at(p, p)) return p;
+                ++line_number;
+                p += 2;
+                break;
+            default:
+                return p;
+        }
+    }
 }
 
 }  // namespace
@@ -419,6 +462,9 @@ VX_TOKEN vrx_next_token() {
     for (;;) {
         char* p = sc.cur;
         switch (byte_class(p)) {
+            case BC_CR:
+                if (!crlf_at(p, p)) return scan_word(p, p + 1);
+                [[fallthrough]];
             case BC_BLANK:
             case BC_LINE_END:
                 sc.cur = skip_space(p);

@@ -30,7 +30,9 @@ enum VX_TOKEN : int32_t {
 
 /// Value of the token just returned. `text` points into the scanner's buffer,
 /// is NUL-terminated and stays valid until the next `vrx_next_token` or
-/// `vrx_set_input`; the parser copies what it keeps.
+/// `vrx_set_input`; the parser copies what it keeps. The VX_TEXT_BLOCK bytes
+/// from `text` on may all be read (those behind the text are unspecified), so
+/// a short text can be copied as one fixed-size block.
 struct VX_TOKEN_VALUE {
     int32_t number;      // NUMBER: 0 to INT32_MAX
     const char* text;    // STRING: at most VX_MAX_TEXT bytes
@@ -38,6 +40,8 @@ struct VX_TOKEN_VALUE {
 };
 
 extern VX_TOKEN_VALUE token_value;
+
+inline constexpr std::size_t VX_TEXT_BLOCK = 32;
 
 /// Reads the next token from the current input.
 VX_TOKEN vrx_next_token();
@@ -47,7 +51,10 @@ VX_TOKEN vrx_next_token();
 /// makes no further callbacks.
 void vrx_end_run();
 /// True once `vrx_end_run` came back, until the next `vrx_parse` starts.
-bool vrx_run_ended();
+inline bool vrx_run_ended() {
+    extern bool vrx_run_end_flag;
+    return vrx_run_end_flag;
+}
 /// Called by `vrx_parse` when it starts.
 void vrx_clear_run_ended();
 
