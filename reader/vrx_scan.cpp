@@ -25,7 +25,8 @@
 //   skipped; it ends a word. A quoted string cannot hold a NUL, so a quote
 //   whose closing quote lies behind a NUL counts as unclosed. Inside a comment
 //   a NUL is comment text, like every other byte up to the line feed.
-// - A terminal is read in blocks like any other stream.
+// - A terminal is read in blocks like any other stream. A null stream set
+//   with vrx_set_input stands for standard input, as when none was ever set.
 // - The line feeds of a quoted string are counted before its length is
 //   checked: "maximum string length exceeded" shows the line of the closing
 //   quote.
@@ -202,6 +203,12 @@ std::size_t refill(char*& keep) {
 }
 
 // --- Tokens ------------------------------------------------------------------
+
+// The one place that moves `line_number`. It stops at INT32_MAX rather than
+// overflow on an input of more than two thousand million lines.
+inline void add_lines(int32_t lines) {
+    line_number = lines < INT32_MAX - line_number ? line_number + lines : INT32_MAX;
+}
 
 // At a CR at `p`: true when a line feed follows, which makes the CR part of
 // the line end: it is skipped and never part of a token. Refills, keeping the
@@ -390,7 +397,7 @@ bool scan_quoted(char* tok) {
     }
     char* text = tok + 1;
     const std::size_t length = drop_crs(text, p);
-    line_number += count_line_ends(text, text + length);
+    add_lines(count_line_ends(text, text + length));
     sc.cur = p + 1;
     if (length + 2 > VX_MAX_TEXT) {
         too_long();
@@ -422,7 +429,7 @@ void skip_comment(char* p) {
     }
 }
 
-// Blanks and line ends; the one place where line ends between tokens are counted.
+// Blanks and line ends between tokens.
 char* skip_space(char* p) {
     for (;;) {
         switch (byte_class(p)) {
@@ -430,12 +437,12 @@ char* skip_space(char* p) {
                 ++p;
                 break;
             case BC_LINE_END:
-                ++line_number;
+                add_lines(1);
                 ++p;
                 break;
             case BC_CR:
                 if (!crlf_at(p, p)) return p;
-                ++line_number;
+                add_lines(1);
                 p += 2;
                 break;
             default:

@@ -178,15 +178,4 @@ TEST(Scanner, NulBytesAreReportedAndSkipped) {
     EXPECT_EQ(q.tokens, (Tokens{"'x'", "'y'", "@1"}));
 }
 
-TEST(Scanner, NewStreamDiscardsWhatIsBuffered) {
-    ParseLog log;
-    TextInput first("one two three");
-    ASSERT_EQ(vrx_next_token(), VX_TOK_STRING);
-    EXPECT_STREQ(token_value.text, "one");
-    TextInput second("four");
-    ASSERT_EQ(vrx_next_token(), VX_TOK_STRING);
-    EXPECT_STREQ(token_value.text, "four");
-    EXPECT_EQ(vrx_next_token(), VX_TOK_END);
-}
-
 }  // namespace
