@@ -432,22 +432,16 @@ void skip_comment(char* p) {
 // Blanks and line ends between tokens.
 char* skip_space(char* p) {
     for (;;) {
-        switch (byte_class(p)) {
-            case BC_BLANK:
-                ++p;
-                break;
-            case BC_LINE_END:
-                add_lines(1);
-                ++p;
-                break;
-            case BC_CR:
-                if (!crlf_at(p, p)) return p;
-                add_lines(1);
-                p += 2;
-                break;
-            default:
-                return p;
+        while (byte_class(p) == BC_BLANK)
+            ++p;
+        if (*p == '\n') {
+            ++p;
+        } else if (*p == '\r' && crlf_at(p, p)) {
+            p += 2;
+        } else {
+            return p;
         }
+        add_lines(1);
     }
 }
 
