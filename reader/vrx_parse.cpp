@@ -41,8 +41,9 @@
 // parser with default reductions. Every state of this grammar's automaton is
 // of one of three kinds, and each kind has its code shape here:
 //  - A single reduction and no shift. The table parser reduces without reading
-//    a look-ahead. These are the states right behind a keyword, a name, a ")"
-//    or "}" that ends a production, and behind "(" (which reduces the empty
+//    a look-ahead. These are the states right behind a name token (46, 47),
+//    a block or signal keyword (16 to 19, 28, 29), a "=" value (45), a ")" or
+//    "}" that ends a production, and behind "(" (which reduces the empty
 //    prop_items, 42, at once). Here: plain code after `shift()`.
 //  - Shifts and one default reduction. The parser reads a look-ahead; a token
 //    that shifts continues the production, any other token, valid or not,

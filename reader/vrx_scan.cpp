@@ -206,8 +206,9 @@ std::size_t refill(char*& keep) {
 
 // The one place that moves `line_number`. It stops at INT32_MAX rather than
 // overflow on an input of more than two thousand million lines.
-inline void add_lines(int32_t lines) {
-    line_number = lines < INT32_MAX - line_number ? line_number + lines : INT32_MAX;
+inline void add_lines(int64_t lines) {
+    const int64_t line = line_number + lines;
+    line_number = line < INT32_MAX ? static_cast<int32_t>(line) : INT32_MAX;
 }
 
 // At a CR at `p`: true when a line feed follows, which makes the CR part of
@@ -370,16 +371,16 @@ std::size_t drop_crs(char* text, const char* end) {
     return static_cast<std::size_t>(out - text);
 }
 
-int32_t count_line_ends(const char* p, const char* end) {
-    int32_t lines = 0;
+int64_t count_line_ends(const char* p, const char* end) {
+    int64_t lines = 0;
     for (; p < end; ++p)
         lines += *p == '\n';
     return lines;
 }
 
-// A quote at `tok`. True with a STRING token when the quote is closed; false
-// after rule 9 when it is not: the quote goes to standard output and scanning
-// resumes right behind it.
+// A quote at `tok`. True with a STRING token when the quote is closed. False
+// when it is not: the quote goes to standard output and scanning resumes
+// right behind it.
 bool scan_quoted(char* tok) {
     char* p = tok + 1;
     for (;;) {

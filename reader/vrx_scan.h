@@ -58,7 +58,8 @@ inline bool vrx_run_ended() {
 /// Called by `vrx_parse` when it starts.
 void vrx_clear_run_ended();
 
-/// The scanner's allocator for its read-ahead buffer (realloc semantics). Tests
-/// replace it to reach the out-of-memory stops.
+/// The scanner's allocator for its read-ahead buffer, with the semantics of
+/// std::realloc; the scanner releases the buffer with std::free. Tests replace
+/// it to reach the out-of-memory stops.
 using VX_REALLOC_FN = void* (*)(void* block, std::size_t size);
 extern VX_REALLOC_FN vrx_scan_realloc;
