@@ -51,7 +51,9 @@ TEST(Parser, SmallestFilesAndAliases) {
                   "begin_block(b, 65535, 0, {}) @1", "end_block() @1", "end_design() @1"});
     expect_parse("DESIGN a b { }\nDESIGN \"DESIGN\" 7 {}", 0,
                  {"do_library_props({}) @1", "add_alias(a, b) @1", "add_alias(DESIGN, 7) @2"});
-    expect_parse("DESIGN a b (P=1) { }", 1, {"do_library_props({}) @1", parse_error(1)});
+    // The parse reads nothing behind the offending "(": the NUL would be reported.
+    expect_parse(std::string("DESIGN a b (\0P=1) { }", 21), 1,
+                 {"do_library_props({}) @1", parse_error(1)});
 }
 
 TEST(Parser, IncompleteFilesFailAtTheirEnd) {
