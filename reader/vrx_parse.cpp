@@ -119,13 +119,13 @@ class Parser {
     int32_t run();
 
   private:
-    VX_TOKEN peek();
+    [[gnu::always_inline]] VX_TOKEN peek();
     void shift() { have_lookahead_ = false; }
     bool syntax_error();
     template <typename Callback, typename... Args>
     void act(Callback callback, Args... args);
 
-    void take_name(char* out);
+    [[gnu::always_inline]] void take_name(char* out);
     bool prop_list();
     bool prop_item();
     void append_prop();
@@ -149,7 +149,7 @@ class Parser {
 
 // Reads a token only when none is held, as the table parser does in every
 // state that has a shift.
-VX_TOKEN Parser::peek() {
+inline VX_TOKEN Parser::peek() {
     if (vrx_run_ended()) return kStopped;
     if (!have_lookahead_) {
         lookahead_ = vrx_next_token();
@@ -170,7 +170,7 @@ void Parser::act(Callback callback, Args... args) {
 }
 
 // name_item (46, 47): the held STRING or NUMBER, shifted.
-void Parser::take_name(char* out) {
+inline void Parser::take_name(char* out) {
     if (lookahead_ == VX_TOK_NUMBER) {
         format_decimal(token_value.number, out);
     } else {

@@ -2,9 +2,13 @@
 //
 // A hand-written lexer: one switch on the class of the current byte, a NUL
 // sentinel behind the buffered bytes so that the inner loops need no bounds
-// check, and token texts handed out in place (the byte behind a token is held
-// aside and replaced by NUL until the next call). Nothing is allocated per
-// token; the buffer grows only while one token is longer than it.
+// check, and token texts handed out in place, with their length. Nothing is
+// allocated per token; the buffer grows only while one token is longer than it.
+//
+// The common tokens are scanned by the inline `vrx_next_token` in vrx_scan.h,
+// inside the parser; it hands everything else to `vrx_scan_token` here: the
+// end of the buffered data (refills), comments, numbers, quoted strings, lone
+// CRs, NUL bytes, over-long words and the fatal stops.
 //
 // Tokens follow the longest match over these rules, the earlier rule winning a
 // tie: comment ("//" to the line end), blanks, separators, line feed, the ten
@@ -35,7 +39,6 @@
 //   makes the buffer grow.
 // - The buffer is released at the end of input and when a new stream is set,
 //   and made afresh for the next read, so no memory is held between files.
-#include <array>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -56,58 +59,28 @@ VX_REALLOC_FN vrx_scan_realloc = realloc_block;
 
 namespace {
 
-enum ByteClass : unsigned char {
-    BC_NUL,        // the sentinel behind the data, or a NUL in the input
-    BC_BLANK,      // space, tab
-    BC_LINE_END,   // line feed
-    BC_CR,         // carriage return: a line end before a line feed, else a word byte
-    BC_QUOTE,      // "
-    BC_SEPARATOR,  // ( ) { } =
-    BC_DIGIT,      // 0-9
-    BC_WORD,       // every other byte; words are runs of BC_DIGIT and BC_WORD
-};
-
-constexpr std::array<unsigned char, 256> make_byte_classes() {
-    std::array<unsigned char, 256> classes{};
-    for (unsigned char& c : classes)
-        c = BC_WORD;
-    classes[0] = BC_NUL;
-    classes[' '] = classes['\t'] = BC_BLANK;
-    classes['\n'] = BC_LINE_END;
-    classes['\r'] = BC_CR;
-    classes['"'] = BC_QUOTE;
-    for (unsigned char c : {'(', ')', '{', '}', '='})
-        classes[c] = BC_SEPARATOR;
-    for (unsigned char c = '0'; c <= '9'; ++c)
-        classes[c] = BC_DIGIT;
-    return classes;
-}
-
-constexpr std::array<unsigned char, 256> kByteClass = make_byte_classes();
-
-inline unsigned char byte_class(const char* p) {
-    return kByteClass[static_cast<unsigned char>(*p)];
-}
-
-inline bool in_word(const char* p) {
-    return byte_class(p) >= BC_DIGIT;
-}
-
 constexpr std::size_t kInitialSize = 16384;
 // Bytes allocated behind the buffer so that a token's text can be read in
 // whole blocks of VX_TEXT_BLOCK bytes (see vrx_scan.h).
 constexpr std::size_t kSlack = VX_TEXT_BLOCK;
 constexpr std::size_t kReadSize = 8192;
 
+// Where `vrx_scan_cur` and `lim` point while there is no buffer, and where
+// `vrx_scan_cur` points once the scan has stopped.
+char no_data[kSlack] = {};
+
+}  // namespace
+
+char* vrx_scan_cur = no_data;
+
+namespace {
+
 struct Scanner {
     std::FILE* input = nullptr;  // null: standard input
     char* buf = nullptr;         // read-ahead buffer of `size` bytes, null when released
     std::size_t size = 0;
-    char* cur = nullptr;      // next byte to scan
-    char* lim = nullptr;      // end of the buffered data; *lim is the NUL sentinel
-    char* hold_at = nullptr;  // the NUL that ends the current token's text
-    char hold_byte = 0;       // the byte it stands in for
-    bool stopped = false;     // a fatal stop happened: end of input until a new stream
+    char* lim = no_data;   // end of the buffered data; *lim is the NUL sentinel
+    bool stopped = false;  // a fatal stop happened: end of input until a new stream
 };
 
 Scanner sc;
@@ -118,20 +91,10 @@ std::FILE* stream() {
 
 // --- Buffer ------------------------------------------------------------------
 
-void release_hold() {
-    if (sc.hold_at) *sc.hold_at = sc.hold_byte;
-    sc.hold_at = nullptr;
-}
-
-void hold(char* end) {
-    sc.hold_at = end;
-    sc.hold_byte = *end;
-    *end = '\0';
-}
-
 void discard_buffer() {
     std::free(sc.buf);
-    sc = Scanner{sc.input, nullptr, 0, nullptr, nullptr, nullptr, 0, sc.stopped};
+    sc = Scanner{sc.input, nullptr, 0, no_data, sc.stopped};
+    vrx_scan_cur = no_data;
 }
 
 // The three stops the run cannot recover from. They bypass the message
@@ -151,7 +114,7 @@ bool create_buffer() {
         fatal_stop("out of dynamic memory in yy_create_buffer()");
         return false;
     }
-    sc.buf = sc.cur = sc.lim = block;
+    sc.buf = vrx_scan_cur = sc.lim = block;
     sc.size = kInitialSize;
     *sc.lim = '\0';
     return true;
@@ -223,54 +186,7 @@ bool crlf_at(char*& keep, char*& p) {
     return p[1] == '\n';
 }
 
-VX_TOKEN separator_token(char c) {
-    switch (c) {
-        case '(':
-            return VX_TOK_LPAREN;
-        case ')':
-            return VX_TOK_RPAREN;
-        case '{':
-            return VX_TOK_LBRACE;
-        case '}':
-            return VX_TOK_RBRACE;
-        default:
-            return VX_TOK_EQUALS;
-    }
-}
-
-template <std::size_t N>
-bool spells(const char* p, const char (&word)[N]) {
-    return std::memcmp(p, word, N - 1) == 0;
-}
-
-// The keyword spelled by [p, p + n), or VX_TOK_STRING.
-VX_TOKEN keyword(const char* p, std::size_t n) {
-    switch (n) {
-        case 3:
-            return spells(p, "PIN") ? VX_TOK_PIN : VX_TOK_STRING;
-        case 4:
-            return spells(p, "PRIM") ? VX_TOK_PRIM : VX_TOK_STRING;
-        case 5:
-            return spells(p, "BLOCK") ? VX_TOK_BLOCK : VX_TOK_STRING;
-        case 6:
-            if (spells(p, "DESIGN")) return VX_TOK_DESIGN;
-            return spells(p, "SIGNAL") ? VX_TOK_SIGNAL : VX_TOK_STRING;
-        case 7:
-            return spells(p, "MAPCONN") ? VX_TOK_MAPCONN : VX_TOK_STRING;
-        case 8:
-            return spells(p, "PHYSPRIM") ? VX_TOK_PHYSPRIM : VX_TOK_STRING;
-        case 9:
-            if (spells(p, "PHYSBLOCK")) return VX_TOK_PHYSBLOCK;
-            return spells(p, "MAPSIGNAL") ? VX_TOK_MAPSIGNAL : VX_TOK_STRING;
-        case 10:
-            return spells(p, "PHYSSIGNAL") ? VX_TOK_PHYSSIGNAL : VX_TOK_STRING;
-        default:
-            return VX_TOK_STRING;
-    }
-}
-
 VX_TOKEN string_token(char* text, std::size_t length) {
-    hold(text + length);
     token_value.text = text;
     token_value.length = length;
     return VX_TOK_STRING;
@@ -290,26 +206,16 @@ VX_TOKEN word_token(char* tok, char* end, std::size_t dropped) {
     if (sc.stopped) return VX_TOK_END;
     const std::size_t length = dropped + static_cast<std::size_t>(end - tok);
     if (length > VX_MAX_TEXT) return too_long();
-    const VX_TOKEN kw = keyword(tok, length);
+    const VX_TOKEN kw = vrx_keyword_token(tok, length);
     if (kw != VX_TOK_STRING) return kw;
     return string_token(tok, length);
-}
-
-// The first byte from `p` on that is no word byte. Four at a time while it
-// can: the sentinel stops the run before the end of the buffered data.
-inline char* word_end(char* p) {
-    while (in_word(p) && in_word(p + 1) && in_word(p + 2) && in_word(p + 3))
-        p += 4;
-    while (in_word(p))
-        ++p;
-    return p;
 }
 
 // Matches the rest of a word from `p` on; [tok, p) is matched already.
 VX_TOKEN scan_word(char* tok, char* p) {
     std::size_t dropped = 0;
     for (;;) {
-        p = word_end(p);
+        p = vrx_word_end(p);
         if (*p == '\r') {
             if (crlf_at(tok, p)) break;
             ++p;  // a lone CR is a word byte
@@ -326,7 +232,7 @@ VX_TOKEN scan_word(char* tok, char* p) {
         p = tok + matched;
         if (!more) break;
     }
-    sc.cur = p;
+    vrx_scan_cur = p;
     return word_token(tok, p, dropped);
 }
 
@@ -344,7 +250,7 @@ bool decimal_value(const char* p, const char* end, int32_t& value) {
 VX_TOKEN scan_number(char* tok) {
     char* p = tok;
     for (;;) {
-        while (byte_class(p) == BC_DIGIT)
+        while (vrx_byte_class(p) == VX_BC_DIGIT)
             ++p;
         if (p != sc.lim) break;
         const std::size_t matched = static_cast<std::size_t>(p - tok);
@@ -353,10 +259,10 @@ VX_TOKEN scan_number(char* tok) {
         p = tok + matched;
         if (!more) break;
     }
-    if (byte_class(p) == BC_WORD || (*p == '\r' && !crlf_at(tok, p))) {
+    if (vrx_byte_class(p) == VX_BC_WORD || (*p == '\r' && !crlf_at(tok, p))) {
         return scan_word(tok, p);
     }
-    sc.cur = p;
+    vrx_scan_cur = p;
     if (!decimal_value(tok, p, token_value.number)) return word_token(tok, p, 0);
     return VX_TOK_NUMBER;
 }
@@ -391,7 +297,7 @@ bool scan_quoted(char* tok) {
         if (p != sc.lim || refill(tok) == 0) {
             if (sc.stopped) return false;
             std::fputc('"', stdout);
-            sc.cur = tok + 1;
+            vrx_scan_cur = tok + 1;
             return false;
         }
         p = tok + matched;
@@ -399,7 +305,7 @@ bool scan_quoted(char* tok) {
     char* text = tok + 1;
     const std::size_t length = drop_crs(text, p);
     add_lines(count_line_ends(text, text + length));
-    sc.cur = p + 1;
+    vrx_scan_cur = p + 1;
     if (length + 2 > VX_MAX_TEXT) {
         too_long();
     } else {
@@ -419,12 +325,12 @@ void skip_comment(char* p) {
     for (;;) {
         const auto rest = static_cast<std::size_t>(sc.lim - p);
         if (char* lf = static_cast<char*>(std::memchr(p, '\n', rest))) {
-            sc.cur = lf;
+            vrx_scan_cur = lf;
             return;
         }
         p = sc.lim;
         if (refill(p) == 0) {
-            sc.cur = p;
+            vrx_scan_cur = p;
             return;
         }
     }
@@ -433,7 +339,7 @@ void skip_comment(char* p) {
 // Blanks and line ends between tokens.
 char* skip_space(char* p) {
     for (;;) {
-        while (byte_class(p) == BC_BLANK)
+        while (vrx_byte_class(p) == VX_BC_BLANK)
             ++p;
         if (*p == '\n') {
             ++p;
@@ -454,45 +360,42 @@ void vrx_set_input(std::FILE* stream) {
     sc.stopped = false;
 }
 
-VX_TOKEN vrx_next_token() {
-    release_hold();
-    if (sc.stopped) {
-        discard_buffer();
-        return VX_TOK_END;
-    }
-    if (!sc.buf && !create_buffer()) return VX_TOK_END;
+namespace {
+
+// The scanner's one switch on the class of the current byte.
+VX_TOKEN scan_token() {
     for (;;) {
-        char* p = sc.cur;
-        switch (byte_class(p)) {
-            case BC_CR:
+        char* p = vrx_scan_cur;
+        switch (vrx_byte_class(p)) {
+            case VX_BC_CR:
                 if (!crlf_at(p, p)) return scan_word(p, p + 1);
                 [[fallthrough]];
-            case BC_BLANK:
-            case BC_LINE_END:
-                sc.cur = skip_space(p);
+            case VX_BC_BLANK:
+            case VX_BC_LINE_END:
+                vrx_scan_cur = skip_space(p);
                 break;
-            case BC_SEPARATOR:
-                sc.cur = p + 1;
-                return separator_token(*p);
-            case BC_DIGIT:
+            case VX_BC_SEPARATOR:
+                vrx_scan_cur = p + 1;
+                return vrx_separator_token(*p);
+            case VX_BC_DIGIT:
                 return scan_number(p);
-            case BC_WORD:
+            case VX_BC_WORD:
                 if (*p == '/' && starts_comment(p)) {
                     skip_comment(p);
                     break;
                 }
                 return scan_word(p, p + 1);
-            case BC_QUOTE:
+            case VX_BC_QUOTE:
                 if (scan_quoted(p)) return VX_TOK_STRING;
                 if (sc.stopped) return VX_TOK_END;
                 break;
-            case BC_NUL:
+            case VX_BC_NUL:
                 if (p != sc.lim) {
-                    sc.cur = p + 1;
+                    vrx_scan_cur = p + 1;
                     vrx_parse_error("invalid NUL byte in input");
                     if (vrx_run_ended()) return VX_TOK_END;
                 } else if (refill(p) > 0) {
-                    sc.cur = p;
+                    vrx_scan_cur = p;
                 } else {
                     discard_buffer();
                     return VX_TOK_END;
@@ -500,4 +403,19 @@ VX_TOKEN vrx_next_token() {
                 break;
         }
     }
+}
+
+}  // namespace
+
+VX_TOKEN vrx_scan_token(char* p) {
+    if (sc.stopped) {
+        discard_buffer();
+        return VX_TOK_END;
+    }
+    vrx_scan_cur = p;
+    if (!sc.buf && !create_buffer()) return VX_TOK_END;
+    const VX_TOKEN token = scan_token();
+    // The buffer stays until the next call, which reports the end of input.
+    if (sc.stopped) vrx_scan_cur = no_data;
+    return token;
 }
