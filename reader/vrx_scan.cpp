@@ -7,7 +7,7 @@
 //
 // The common tokens are scanned by the inline `vrx_next_token` in vrx_scan.h,
 // inside the parser; it hands everything else to `vrx_scan_token` here: the
-// end of the buffered data (refills), comments, numbers, quoted strings, lone
+// end of the buffered data (refills), comments, long numbers, quoted strings, lone
 // CRs, NUL bytes, over-long words and the fatal stops.
 //
 // Tokens follow the longest match over these rules, the earlier rule winning a

@@ -2,10 +2,12 @@
 // Not part of the reader's public header: only the reader itself and its
 // tests include it.
 //
-// The scanner's common tokens (words, keywords, separators, with the blanks and
-// line feeds before them) are scanned by the inline `vrx_next_token` below, so
-// that the parser reads them without a call; every other case goes to
-// `vrx_scan_token` in vrx_scan.cpp, which describes the scanner as a whole.
+// The scanner's common tokens (words, keywords, short numbers, separators, with
+// the blanks and line ends before them) are scanned by the inline
+// `vrx_next_token` below, so that the parser reads them without a call and
+// each of its call sites predicts the next token's class on its own. Every
+// other case goes to `vrx_scan_token` in vrx_scan.cpp, which describes the
+// scanner as a whole.
 #pragma once
 
 #include <array>
@@ -232,6 +234,24 @@ inline VX_TOKEN vrx_separator_token(char c) {
     return VX_TOK_STRING;
 }
 
+/// A number from `tok` on, when it has at most nine digits (so it is in range)
+/// and ends at a blank, line end, quote or separator; anything else is left
+/// to `vrx_scan_token`.
+inline VX_TOKEN vrx_number_token(char* tok) {
+    int32_t value = 0;
+    char* p = tok;
+    do {
+        value = value * 10 + (*p - '0');
+        ++p;
+    } while (vrx_byte_class(p) == VX_BC_DIGIT && p - tok < 9);
+    const unsigned char stop = vrx_byte_class(p);
+    const bool lone_cr = stop == VX_BC_CR && p[1] != '\n';
+    if (stop >= VX_BC_DIGIT || stop == VX_BC_NUL || lone_cr) return vrx_scan_token(tok);
+    vrx_scan_cur = p;
+    token_value.number = value;
+    return VX_TOK_NUMBER;
+}
+
 /// Reads the next token from the current input.
 [[gnu::always_inline]] inline VX_TOKEN vrx_next_token() {
     char* p = vrx_scan_cur;
@@ -244,12 +264,16 @@ inline VX_TOKEN vrx_separator_token(char c) {
             case VX_BC_LINE_END:
                 if (line_number < INT32_MAX) ++line_number;
                 [[fallthrough]];
-            case VX_BC_BLANK:
-                ++p;
+            case VX_BC_BLANK:  // the whole run: one dispatch per blank costs more
+                do
+                    ++p;
+                while (vrx_byte_class(p) == VX_BC_BLANK);
                 break;
             case VX_BC_SEPARATOR:
                 vrx_scan_cur = p + 1;
                 return vrx_separator_token(*p);
+            case VX_BC_DIGIT:
+                return vrx_number_token(p);
             case VX_BC_WORD:
                 if (*p == '/') return vrx_scan_token(p);  // maybe a comment
                 return vrx_word_token(p);

@@ -95,6 +95,9 @@ TEST(Scanner, NumbersAndDigitRunsAboveTheIntRange) {
     EXPECT_EQ(scan("007 0 2147483647 2147483648 00000000000000000000042 99999999999 12(").tokens,
               (Tokens{"#7", "#0", "#2147483647", "'2147483648'", "#42", "'99999999999'", "#12", "(",
                       "@1"}));
+    // Ended by a line end, a lone CR, a quote; nine and ten digits.
+    EXPECT_EQ(scan("5\r\n6\n7\rx 8\"q\" 999999999=1000000000").tokens,
+              (Tokens{"#5", "#6", "'7\rx'", "#8", "'q'", "#999999999", "=", "#1000000000", "@3"}));
 }
 
 TEST(Scanner, CommentsStartOnlyWhereATokenStarts) {
