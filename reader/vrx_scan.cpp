@@ -61,7 +61,8 @@ namespace {
 
 constexpr std::size_t kInitialSize = 16384;
 // Bytes allocated behind the buffer so that a token's text can be read in
-// whole blocks of VX_TEXT_BLOCK bytes (see vrx_scan.h).
+// whole blocks of VX_TEXT_BLOCK bytes, and a word's first 16 bytes compared
+// with a keyword in two loads (see vrx_scan.h).
 constexpr std::size_t kSlack = VX_TEXT_BLOCK;
 constexpr std::size_t kReadSize = 8192;
 

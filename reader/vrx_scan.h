@@ -194,6 +194,7 @@ inline uint64_t vrx_load8(const char* p) {
 }
 
 inline VX_TOKEN vrx_keyword_token(const char* p, std::size_t length) {
+    static_assert(VX_TEXT_BLOCK >= 16, "the slack behind the buffer covers both loads");
     const VX_KEYWORD& k = vrx_keywords[vrx_keyword_slot(static_cast<unsigned char>(*p), length)];
     const uint64_t differ =
         ((vrx_load8(p) ^ k.text[0]) & k.mask[0]) | ((vrx_load8(p + 8) ^ k.text[1]) & k.mask[1]);
