@@ -95,8 +95,8 @@ void BM_BuildAndDesign(benchmark::State& state) {
         library.reset();
         state.ResumeTiming();
     }
-    state.counters["pins/s"] = benchmark::Counter(double(kGates) * kPinsPerGate * state.iterations(),
-                                                  benchmark::Counter::kIsRate);
+    state.counters["pins/s"] = benchmark::Counter(
+        double(kGates) * kPinsPerGate * state.iterations(), benchmark::Counter::kIsRate);
 }
 BENCHMARK(BM_BuildAndDesign)->Unit(benchmark::kMillisecond)->Iterations(3);
 
@@ -168,7 +168,8 @@ void BM_ReadDesignFile(benchmark::State& state) {
     for (auto _ : state) {
         auto start = std::chrono::steady_clock::now();
         HX_DESIGN* loaded = f.read();
-        read_seconds += std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+        read_seconds +=
+            std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
         state.PauseTiming();
         if (loaded == nullptr) {
             state.SkipWithError("design file not read");

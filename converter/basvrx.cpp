@@ -135,7 +135,9 @@ void VRX::init_curr_indices(uint16_t value) {
     std::fill(std::begin(curr_indices), std::end(curr_indices), value);
 }
 
-void VRX::set_parser_status(VX_PARSER_STATUS status) { parser_status = status; }
+void VRX::set_parser_status(VX_PARSER_STATUS status) {
+    parser_status = status;
+}
 
 // The reader's diagnostics mark the parse failed through this callback.
 void vrx_set_parser_status(VX_PARSER_STATUS status) {

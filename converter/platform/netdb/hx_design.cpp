@@ -59,7 +59,8 @@ constexpr std::size_t kLargestChunk = std::size_t{4} << 20;
 }  // namespace
 
 HX_ARENA::~HX_ARENA() {
-    for (std::byte* chunk : chunks_) std::free(chunk);
+    for (std::byte* chunk : chunks_)
+        std::free(chunk);
 }
 
 void HX_ARENA::grow(std::size_t at_least) {
@@ -78,60 +79,6 @@ void HX_ARENA::grow(std::size_t at_least) {
     left_ = size;
     reserved_ += size;
     next_chunk_ = std::min(next_chunk_ * 2, kLargestChunk);
-}
-
-std::size_t HX_TAG_TABLE::home(uint32_t tag) const {
-    return (static_cast<uint64_t>(tag) * 0x9E3779B97F4A7C15ull >> 20) & (slots_.size() - 1);
-}
-
-HX_NETWORK* HX_TAG_TABLE::find(uint32_t tag) const {
-    if (slots_.empty()) return nullptr;
-    for (std::size_t i = home(tag);; i = (i + 1) & (slots_.size() - 1)) {
-        HX_NETWORK* net = slots_[i];
-        if (net == nullptr || net->get_tag() == tag) return net;
-    }
-}
-
-bool HX_TAG_TABLE::insert(HX_NETWORK* net) {
-    if ((used_ + 1) * 2 > slots_.size()) rehash(std::max<std::size_t>(16, slots_.size() * 2));
-    for (std::size_t i = home(net->get_tag());; i = (i + 1) & (slots_.size() - 1)) {
-        if (slots_[i] == nullptr) {
-            slots_[i] = net;
-            ++used_;
-            max_tag_ = std::max(max_tag_, net->get_tag());
-            return true;
-        }
-        if (slots_[i]->get_tag() == net->get_tag()) return false;
-    }
-}
-
-void HX_TAG_TABLE::erase(uint32_t tag) {
-    if (slots_.empty()) return;
-    std::size_t mask = slots_.size() - 1;
-    std::size_t i = home(tag);
-    while (slots_[i] != nullptr && slots_[i]->get_tag() != tag) i = (i + 1) & mask;
-    if (slots_[i] == nullptr) return;
-    slots_[i] = nullptr;
-    --used_;
-    // Shift back the entries of the run behind the hole that may no longer
-    // be reachable from their home slot.
-    for (std::size_t j = (i + 1) & mask; slots_[j] != nullptr; j = (j + 1) & mask) {
-        std::size_t h = home(slots_[j]->get_tag());
-        if (((j - h) & mask) >= ((j - i) & mask)) {
-            slots_[i] = slots_[j];
-            slots_[j] = nullptr;
-            i = j;
-        }
-    }
-}
-
-void HX_TAG_TABLE::rehash(std::size_t capacity) {
-    std::vector<HX_NETWORK*> old(capacity, nullptr);
-    old.swap(slots_);
-    used_ = 0;
-    for (HX_NETWORK* net : old) {
-        if (net != nullptr) insert(net);
-    }
 }
 
 // --- pins --------------------------------------------------------------------
@@ -159,7 +106,9 @@ HX_MAPSIGNAL* HX_PIN::get_map_signal() const {
 
 // --- blocks ------------------------------------------------------------------
 
-HX_BLOCK::~HX_BLOCK() { delete lists_; }
+HX_BLOCK::~HX_BLOCK() {
+    delete lists_;
+}
 
 HX_BLOCK_LISTS& HX_BLOCK::lists() {
     if (lists_ == nullptr) {
@@ -180,7 +129,9 @@ const HX_PRIMITIVE* HX_BLOCK::get_primitive() const {
     return const_cast<HX_BLOCK*>(this)->get_primitive();
 }
 
-void HX_BLOCK::set_name(const char* name) { name_ = design_->intern(name); }
+void HX_BLOCK::set_name(const char* name) {
+    name_ = design_->intern(name);
+}
 
 HX_BASEPHYSBLOCK* HX_BLOCK::get_phys_parent() const {
     const auto& map = design_->phys_parent_;
@@ -194,7 +145,8 @@ const char* HX_BLOCK::get_hiername() const {
     out.clear();
     if (name_ == nullptr || *name_ == '\0') return out.c_str();
     std::vector<const HX_BLOCK*> chain;
-    for (const HX_BLOCK* b = this; b != nullptr; b = b->parent_) chain.push_back(b);
+    for (const HX_BLOCK* b = this; b != nullptr; b = b->parent_)
+        chain.push_back(b);
     for (auto it = chain.rbegin(); it != chain.rend(); ++it) {
         if (it != chain.rbegin()) out += '/';
         if ((*it)->name_ != nullptr) out += (*it)->name_;
@@ -263,11 +215,13 @@ UT_BLIST_ITER<HX_SIGNAL>* HX_BLOCK::create_global_siglist(uint8_t own_pins) cons
     };
     if (lists_ != nullptr) {
         for (const HX_BLOCK* child : lists_->children) {
-            for (uint16_t i = 0; i < child->pin_count_; ++i) note(child->pins_[i].outer_);
+            for (uint16_t i = 0; i < child->pin_count_; ++i)
+                note(child->pins_[i].outer_);
         }
     }
     if (own_pins) {
-        for (uint16_t i = 0; i < pin_count_; ++i) note(pins_[i].inner_);
+        for (uint16_t i = 0; i < pin_count_; ++i)
+            note(pins_[i].inner_);
     }
     return new UT_BLIST_ITER<HX_SIGNAL>(std::move(list));
 }
@@ -298,7 +252,9 @@ const HX_BLOCK* HX_PRIMITIVE::get_block() const {
     return const_cast<HX_PRIMITIVE*>(this)->get_block();
 }
 
-uint16_t HX_PRIMITIVE::get_pin_count() const { return get_block()->get_pin_count(); }
+uint16_t HX_PRIMITIVE::get_pin_count() const {
+    return get_block()->get_pin_count();
+}
 
 HX_PIN_PRIMITIVE* HX_PRIMITIVE::get_prim_pin(uint16_t index) const {
     return get_block()->get_pin(index);
@@ -308,9 +264,13 @@ uint16_t HX_PRIMITIVE::get_prim_index(int32_t role, uint16_t ordinal) const {
     return hx_prim_pin_index(type_, width_, role, ordinal);
 }
 
-bool HX_PRIMITIVE::is_param_pin(int32_t role) const { return hx_prim_role_repeats(type_, role); }
+bool HX_PRIMITIVE::is_param_pin(int32_t role) const {
+    return hx_prim_role_repeats(type_, role);
+}
 
-bool HX_PRIMITIVE::type_has_width(int32_t type) { return hx_prim_takes_width(type); }
+bool HX_PRIMITIVE::type_has_width(int32_t type) {
+    return hx_prim_takes_width(type);
+}
 
 uint32_t HX_PRIMITIVE::pin_count_for(int32_t type, uint16_t width) {
     return hx_prim_pin_count(type, width);
@@ -332,9 +292,13 @@ HX_DESIGN* HX_SIGNAL::get_design() const {
     return get_block()->get_design();
 }
 
-HX_SIGNAL::CONN_ITER* HX_SIGNAL::create_conn_iter() const { return new CONN_ITER(&last_conn_); }
+HX_SIGNAL::CONN_ITER* HX_SIGNAL::create_conn_iter() const {
+    return new CONN_ITER(&last_conn_);
+}
 
-void HX_SIGNAL::delete_conn_iter(CONN_ITER* iter) const { delete iter; }
+void HX_SIGNAL::delete_conn_iter(CONN_ITER* iter) const {
+    delete iter;
+}
 
 HX_CONN* HX_CONN_LIST_ITER::l_next() {
     HX_CONN* last = *last_;
@@ -378,7 +342,9 @@ void HX_NETWORK::delete_signal_iter(UT_BLIST_ITER<HX_SIGNAL>* iter) const {
     delete iter;
 }
 
-void HX_MAPSIGNAL::set_name(const char* name) { name_ = block_->get_design()->intern(name); }
+void HX_MAPSIGNAL::set_name(const char* name) {
+    name_ = block_->get_design()->intern(name);
+}
 
 HX_CONN* HX_MAPSIGNAL::create_mapconn(HX_BLOCK* block, uint16_t index) {
     HX_DESIGN* design = block_->get_design();
@@ -395,7 +361,9 @@ HX_SIGNAL::CONN_ITER* HX_MAPSIGNAL::create_conn_iter() const {
     return new HX_SIGNAL::CONN_ITER(&last_conn_);
 }
 
-void HX_MAPSIGNAL::delete_conn_iter(HX_SIGNAL::CONN_ITER* iter) const { delete iter; }
+void HX_MAPSIGNAL::delete_conn_iter(HX_SIGNAL::CONN_ITER* iter) const {
+    delete iter;
+}
 
 // --- the design: construction and destruction ------------------------------
 
@@ -406,7 +374,8 @@ HX_DESIGN::HX_DESIGN(HX_LIBRARY* library, const char* name)
 
 HX_DESIGN::~HX_DESIGN() {
     for (HX_BLOCK* block : blocks_) {
-        for (uint16_t i = 0; i < block->pin_count_; ++i) block->pins_[i].~HX_PIN();
+        for (uint16_t i = 0; i < block->pin_count_; ++i)
+            block->pins_[i].~HX_PIN();
         if (block->lists_ != nullptr) {
             for (HX_SIGNAL* s : block->lists_->signals) {
                 if (s != nullptr) s->~HX_SIGNAL();
@@ -427,14 +396,18 @@ HX_DESIGN::~HX_DESIGN() {
                 break;
         }
     }
-    for (HX_SIGNAL* s : globals_) s->~HX_SIGNAL();
+    for (HX_SIGNAL* s : globals_)
+        s->~HX_SIGNAL();
     for (HX_NETWORK* net : networks_) {
         if (net != nullptr) net->~HX_NETWORK();
     }
-    for (HX_MAPSIGNAL* m : mapsignals_) m->~HX_MAPSIGNAL();
+    for (HX_MAPSIGNAL* m : mapsignals_)
+        m->~HX_MAPSIGNAL();
 }
 
-void HX_DESIGN::set_name(const char* name) { name_ = intern(name); }
+void HX_DESIGN::set_name(const char* name) {
+    name_ = intern(name);
+}
 
 const char* HX_DESIGN::intern(const char* text) {
     if (text == nullptr) return nullptr;
@@ -448,8 +421,7 @@ const char* HX_DESIGN::intern(const char* text) {
 // --- the design: blocks ------------------------------------------------------
 
 template <class T, class... Args>
-T* HX_DESIGN::make_block(HX_BLOCK* parent, uint16_t pin_count, const char* name,
-                         Args&&... args) {
+T* HX_DESIGN::make_block(HX_BLOCK* parent, uint16_t pin_count, const char* name, Args&&... args) {
     void* memory = store_->objects.alloc(sizeof(T), alignof(T));
     T* block = new (memory) T(std::forward<Args>(args)...);
     block->design_ = this;
@@ -477,17 +449,16 @@ HX_PIN* HX_DESIGN::make_pins(HX_BLOCK* block, uint16_t count) {
 
 void HX_DESIGN::make_prim_pins(HX_BLOCK* block, HX_PRIMITIVE* prim) {
     uint16_t index = 0;
-    hx_prim_for_each_pin(prim->get_type(), prim->get_width(),
-                         [&](int32_t role, uint16_t ordinal, bool repeated) {
-                             HX_PIN& pin = block->pins_[index++];
-                             pin.role_ = static_cast<uint8_t>(role);
-                             pin.dir_ = static_cast<uint8_t>(hx_prim_pin_dir(prim->get_type(), role));
-                             pin.name_ = hx_prim_pin_name(role, repeated ? ordinal : HX_NO_INDEX);
-                         });
+    hx_prim_for_each_pin(
+        prim->get_type(), prim->get_width(), [&](int32_t role, uint16_t ordinal, bool repeated) {
+            HX_PIN& pin = block->pins_[index++];
+            pin.role_ = static_cast<uint8_t>(role);
+            pin.dir_ = static_cast<uint8_t>(hx_prim_pin_dir(prim->get_type(), role));
+            pin.name_ = hx_prim_pin_name(role, repeated ? ordinal : HX_NO_INDEX);
+        });
 }
 
-HX_LOGBLOCK* HX_DESIGN::create_logblock(HX_BASELOGBLOCK* parent, uint16_t width,
-                                        const char* name) {
+HX_LOGBLOCK* HX_DESIGN::create_logblock(HX_BASELOGBLOCK* parent, uint16_t width, const char* name) {
     if (parent == nullptr ? log_root_ != nullptr : !owns(parent) || parent->is_primitive())
         return nullptr;
     HX_LOGBLOCK* block = make_block<HX_LOGBLOCK>(parent, width, name);
@@ -610,7 +581,8 @@ uint32_t HX_DESIGN::next_tag() {
     // Tags are handed out in rising order, so a free one is found without a
     // lookup until the numbers wrap or a file brought in larger tags.
     if (last_tag_ != 0 && last_tag_ > store_->tags.max_tag()) return last_tag_;
-    while (last_tag_ == 0 || store_->tags.find(last_tag_) != nullptr) ++last_tag_;
+    while (last_tag_ == 0 || store_->tags.find(last_tag_) != nullptr)
+        ++last_tag_;
     return last_tag_;
 }
 
@@ -629,7 +601,9 @@ HX_NETWORK* HX_DESIGN::make_network(HX_SIGNAL* first, uint32_t tag) {
     return net;
 }
 
-HX_NETWORK* HX_DESIGN::find_net_tag(uint32_t tag) const { return store_->tags.find(tag); }
+HX_NETWORK* HX_DESIGN::find_net_tag(uint32_t tag) const {
+    return store_->tags.find(tag);
+}
 
 HX_NETWORK* hx_find_net_tag(const HX_DESIGN* design, uint32_t tag) {
     return design ? design->find_net_tag(tag) : nullptr;
@@ -685,7 +659,8 @@ void HX_DESIGN::drop_network(HX_NETWORK* net) {
 void HX_DESIGN::unlink_member(HX_SIGNAL* signal) {
     HX_NETWORK* net = signal->network_;
     HX_SIGNAL* prev = signal;
-    while (prev->next_member_ != signal) prev = prev->next_member_;
+    while (prev->next_member_ != signal)
+        prev = prev->next_member_;
     if (prev == signal) {
         drop_network(net);
     } else {
@@ -791,12 +766,11 @@ void HX_DESIGN::delete_signal(HX_SIGNAL* signal) {
 
 // --- the design: mapping -----------------------------------------------------
 
-HX_MAPSIGNAL* HX_DESIGN::make_mapsignal(HX_BASEPHYSBLOCK* block, uint16_t index,
-                                        const char* name) {
+HX_MAPSIGNAL* HX_DESIGN::make_mapsignal(HX_BASEPHYSBLOCK* block, uint16_t index, const char* name) {
     HX_PIN* pin = block->get_pin(index);
     if (mapsignal_of_pin_.contains(pin)) return nullptr;
-    auto* m = new (store_->objects.alloc(sizeof(HX_MAPSIGNAL), alignof(HX_MAPSIGNAL)))
-        HX_MAPSIGNAL();
+    auto* m =
+        new (store_->objects.alloc(sizeof(HX_MAPSIGNAL), alignof(HX_MAPSIGNAL))) HX_MAPSIGNAL();
     m->block_ = block;
     m->pin_ = index;
     m->name_ = intern(name);

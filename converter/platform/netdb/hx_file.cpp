@@ -1011,7 +1011,7 @@ class HX_FILE_IO::Decoder {
     /// their old tags go before any new one comes in.
     static void retag(HX_DESIGN& design, const std::vector<HX_NETWORK*>& nets,
                       const std::vector<uint32_t>& tags) {
-        HX_TAG_TABLE& table = design.store_->tags;
+        HX_TAG_TABLE<>& table = design.store_->tags;
         for (std::size_t k = 0; k < nets.size(); ++k) {
             if (nets[k]->tag_ != tags[k]) table.erase(nets[k]->tag_);
         }

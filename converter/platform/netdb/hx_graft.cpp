@@ -89,9 +89,10 @@ HX_BLOCK* HX_GRAFT::copy_block(const HX_BLOCK* from, HX_BLOCK* parent) {
     const HX_PRIMITIVE* prim = from->get_primitive();
     if (from->is_physical()) {
         auto* phys_parent = static_cast<HX_BASEPHYSBLOCK*>(parent);
-        copy = prim ? static_cast<HX_BLOCK*>(target_.create_physprim(
-                          phys_parent, prim->get_type(), prim->get_width(), from->get_name()))
-                    : target_.create_physblock(phys_parent, from->get_pin_count(), from->get_name());
+        copy = prim
+                   ? static_cast<HX_BLOCK*>(target_.create_physprim(
+                         phys_parent, prim->get_type(), prim->get_width(), from->get_name()))
+                   : target_.create_physblock(phys_parent, from->get_pin_count(), from->get_name());
     } else {
         auto* log_parent = static_cast<HX_BASELOGBLOCK*>(parent);
         copy = prim ? static_cast<HX_BLOCK*>(target_.create_logprim(
@@ -139,12 +140,14 @@ void HX_GRAFT::copy_connections(const HX_BLOCK* source_root, DARRAY_NAME* global
     while (HX_BLOCK* block = blocks->l_next()) {
         if (!blocks_.contains(block)) continue;
         auto* signals = block->create_signal_iter();
-        while (HX_SIGNAL* s = signals->l_next()) ordered.push_back(s);
+        while (HX_SIGNAL* s = signals->l_next())
+            ordered.push_back(s);
         block->delete_signal_iter(signals);
     }
     source_.delete_block_iter(blocks);
     auto* globals = source_.create_global_iter();
-    while (HX_SIGNAL* global = globals->l_next()) ordered.push_back(global);
+    while (HX_SIGNAL* global = globals->l_next())
+        ordered.push_back(global);
     source_.delete_global_iter(globals);
     for (HX_SIGNAL* s : ordered) {
         HX_SIGNAL* copy = s->is_global() ? nullptr : signals_.at(s);
@@ -235,7 +238,8 @@ void HX_GRAFT::copy_maps() {
         auto log = blocks_.find(block);
         auto phys = parent ? blocks_.find(parent) : blocks_.end();
         if (log != blocks_.end() && phys != blocks_.end())
-            target_.set_block_phys_parent(log->second, static_cast<HX_BASEPHYSBLOCK*>(phys->second));
+            target_.set_block_phys_parent(log->second,
+                                          static_cast<HX_BASEPHYSBLOCK*>(phys->second));
     }
     source_.delete_block_iter(blocks);
 }
@@ -248,7 +252,8 @@ template <class Block>
 bool pins_match(const HX_BLOCK* instance, const Block* root) {
     if (instance->get_pin_count() != root->get_pin_count()) return false;
     for (uint16_t i = 0; i < root->get_pin_count(); ++i) {
-        if (!same_text(instance->get_pin(i)->get_name(), root->get_pin(i)->get_name())) return false;
+        if (!same_text(instance->get_pin(i)->get_name(), root->get_pin(i)->get_name()))
+            return false;
     }
     return true;
 }
@@ -290,8 +295,7 @@ Block* graft_into(HX_DESIGN& target, Block* instance, HX_DESIGN* other, const HX
                   uint8_t omit_props, uint8_t omit_maps, DARRAY_NAME* globals_out,
                   uint8_t check_only) {
     if (instance == nullptr || other == nullptr || other == &target || source == nullptr ||
-        instance->get_design() != &target || !instance->isempty() ||
-        !pins_match(instance, source))
+        instance->get_design() != &target || !instance->isempty() || !pins_match(instance, source))
         return nullptr;
     if (check_only) return instance;
     HX_GRAFT graft(target, *other, !omit_props);

@@ -69,8 +69,10 @@ bool HX_LIBRARY::rekey(uint8_t casesense) {
         return name == nullptr || keys.try_emplace(key_of(name), design).second;
     };
     bool ok = true;
-    for (const HX_LIBLINK* link : links_) ok = ok && enter(link->get_design()->get_name(), link->get_design());
-    for (const auto& [alias, design] : aliases_) ok = ok && enter(alias.c_str(), design);
+    for (const HX_LIBLINK* link : links_)
+        ok = ok && enter(link->get_design()->get_name(), link->get_design());
+    for (const auto& [alias, design] : aliases_)
+        ok = ok && enter(alias.c_str(), design);
     if (!ok) {
         casesense_ = old;
         return false;
@@ -86,7 +88,8 @@ UT_BLIST_ITER<HX_LIBLINK>* HX_LIBRARY::create_liblink_iter() const {
 // --- HX_ENVIRONMENT ----------------------------------------------------------
 
 HX_ENVIRONMENT::~HX_ENVIRONMENT() {
-    for (HX_LIBRARY* library : libraries_) delete library;
+    for (HX_LIBRARY* library : libraries_)
+        delete library;
 }
 
 HX_LIBRARY* HX_ENVIRONMENT::create_library(const char* name, uint8_t casesense) {

@@ -9,23 +9,29 @@
 namespace {
 
 constexpr HX_PRIM_ROLE kEnd{-1, false};
-#define ROLE(r) HX_PRIM_ROLE{HX_PPIN_##r, false}
-#define REPEAT(r) HX_PRIM_ROLE{HX_PPIN_##r, true}
+#define ROLE(r)            \
+    HX_PRIM_ROLE {         \
+        HX_PPIN_##r, false \
+    }
+#define REPEAT(r)         \
+    HX_PRIM_ROLE {        \
+        HX_PPIN_##r, true \
+    }
 
 constexpr HX_PRIM_ROLE kBuf[] = {ROLE(IN), ROLE(OUT), kEnd};
 constexpr HX_PRIM_ROLE kGate[] = {REPEAT(IN), ROLE(OUT), kEnd};
 constexpr HX_PRIM_ROLE kMux[] = {ROLE(INA), ROLE(INB), ROLE(SEL), ROLE(OUT), kEnd};
 constexpr HX_PRIM_ROLE kTri[] = {ROLE(IN), ROLE(CTL), ROLE(OUT), kEnd};
-constexpr HX_PRIM_ROLE kSff[] = {ROLE(IN),  ROLE(CLK),  ROLE(CE),  ROLE(SET), ROLE(RST),
+constexpr HX_PRIM_ROLE kSff[] = {ROLE(IN),   ROLE(CLK),  ROLE(CE),  ROLE(SET), ROLE(RST),
                                  ROLE(SSET), ROLE(SRST), ROLE(OUT), kEnd};
-constexpr HX_PRIM_ROLE kFf[] = {ROLE(IN), ROLE(CLK), ROLE(CE), ROLE(SET), ROLE(RST), ROLE(OUT),
-                                kEnd};
+constexpr HX_PRIM_ROLE kFf[] = {ROLE(IN),  ROLE(CLK), ROLE(CE), ROLE(SET),
+                                ROLE(RST), ROLE(OUT), kEnd};
 constexpr HX_PRIM_ROLE kLatch[] = {ROLE(IN), ROLE(CTL), ROLE(SET), ROLE(RST), ROLE(OUT), kEnd};
 constexpr HX_PRIM_ROLE kPad[] = {ROLE(PAD), kEnd};
 constexpr HX_PRIM_ROLE kSource[] = {ROLE(OUT), kEnd};
 constexpr HX_PRIM_ROLE kRam[] = {ROLE(IN), REPEAT(ADR), ROLE(CE), ROLE(OUT), kEnd};
 constexpr HX_PRIM_ROLE kRams[] = {ROLE(IN), REPEAT(ADR), ROLE(CLK), ROLE(CE), ROLE(OUT), kEnd};
-constexpr HX_PRIM_ROLE kRamd[] = {ROLE(IN),  REPEAT(WADR), REPEAT(RADR), ROLE(CLK),
+constexpr HX_PRIM_ROLE kRamd[] = {ROLE(IN), REPEAT(WADR), REPEAT(RADR), ROLE(CLK),
                                   ROLE(CE), ROLE(OUT),    kEnd};
 constexpr HX_PRIM_ROLE kRom[] = {REPEAT(ADR), ROLE(OUT), kEnd};
 
@@ -33,11 +39,13 @@ constexpr HX_PRIM_ROLE kRom[] = {REPEAT(ADR), ROLE(OUT), kEnd};
 #undef REPEAT
 
 constexpr const char* kRoleNames[HX_PIN_PRIMITIVE_TYPE_COUNT] = {
-    "IN", "OUT", "CTL", "CLK", "CE", "SET", "RST", "PAD",
+    "IN",  "OUT",  "CTL",  "CLK", "CE",  "SET", "RST",  "PAD",
     "ADR", "RADR", "WADR", "SEL", "INA", "INB", "SSET", "SRST",
 };
 
-bool valid_role(int32_t role) { return role >= 0 && role < HX_PIN_PRIMITIVE_TYPE_COUNT; }
+bool valid_role(int32_t role) {
+    return role >= 0 && role < HX_PIN_PRIMITIVE_TYPE_COUNT;
+}
 
 }  // namespace
 
@@ -102,7 +110,8 @@ uint32_t hx_prim_pin_count(int32_t type, uint16_t width) {
     bool needs_width = hx_prim_takes_width(type);
     if (needs_width && (width == 0 || width == HX_NO_INDEX)) return 0;
     uint32_t count = 0;
-    for (; roles->role >= 0; ++roles) count += roles->repeated ? width : 1;
+    for (; roles->role >= 0; ++roles)
+        count += roles->repeated ? width : 1;
     return count <= 0xFFFF ? count : 0;
 }
 

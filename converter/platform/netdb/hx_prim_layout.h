@@ -45,6 +45,7 @@ void hx_prim_for_each_pin(int32_t type, uint16_t width, Visit&& visit) {
             visit(int32_t{roles->role}, uint16_t{0}, false);
             continue;
         }
-        for (uint32_t n = 0; n < width; ++n) visit(int32_t{roles->role}, static_cast<uint16_t>(n), true);
+        for (uint32_t n = 0; n < width; ++n)
+            visit(int32_t{roles->role}, static_cast<uint16_t>(n), true);
     }
 }

@@ -14,16 +14,26 @@ struct PredefinedName {
 
 // The names the database knows, with the kind of value each takes.
 constexpr PredefinedName kPredefined[] = {
-    {"TRANSPARENT", HX_PROP_FLAG},     {"UNUSED", HX_PROP_FLAG},
-    {"CREATE_TIMESTAMP", HX_PROP_INT}, {"MERGEDTO", HX_PROP_INT},
-    {"MERGEDFROM", HX_PROP_INT},       {"JOINED", HX_PROP_INT},
-    {"DRIVE", HX_PROP_INT},            {"FANOUT", HX_PROP_INT},
-    {"LOAD", HX_PROP_FLOAT},           {"CAP", HX_PROP_FLOAT},
-    {"MAXDELAY", HX_PROP_TIMING},      {"MINDELAY", HX_PROP_TIMING},
-    {"SETUP", HX_PROP_TIMING},         {"HOLD", HX_PROP_TIMING},
-    {"CLK2OUT", HX_PROP_TIMING},       {"CLKREF", HX_PROP_PINREF},
-    {"SETUPREF", HX_PROP_PINREF},      {"HOLDREF", HX_PROP_PINREF},
-    {"TIMESPEC", HX_PROP_TIMINGSTR},   {"PERIOD", HX_PROP_TIMINGSTR},
+    {"TRANSPARENT", HX_PROP_FLAG},
+    {"UNUSED", HX_PROP_FLAG},
+    {"CREATE_TIMESTAMP", HX_PROP_INT},
+    {"MERGEDTO", HX_PROP_INT},
+    {"MERGEDFROM", HX_PROP_INT},
+    {"JOINED", HX_PROP_INT},
+    {"DRIVE", HX_PROP_INT},
+    {"FANOUT", HX_PROP_INT},
+    {"LOAD", HX_PROP_FLOAT},
+    {"CAP", HX_PROP_FLOAT},
+    {"MAXDELAY", HX_PROP_TIMING},
+    {"MINDELAY", HX_PROP_TIMING},
+    {"SETUP", HX_PROP_TIMING},
+    {"HOLD", HX_PROP_TIMING},
+    {"CLK2OUT", HX_PROP_TIMING},
+    {"CLKREF", HX_PROP_PINREF},
+    {"SETUPREF", HX_PROP_PINREF},
+    {"HOLDREF", HX_PROP_PINREF},
+    {"TIMESPEC", HX_PROP_TIMINGSTR},
+    {"PERIOD", HX_PROP_TIMINGSTR},
 };
 
 bool holds_text(HX_PROP_TYPE kind) {
@@ -105,7 +115,9 @@ bool HX_PROPERTY::get_timing(HX_PROP_TIMING_DATA& record) const {
     return true;
 }
 
-const char* HX_PROPERTY::get_text() const { return holds_text(kind_) ? text_.c_str() : nullptr; }
+const char* HX_PROPERTY::get_text() const {
+    return holds_text(kind_) ? text_.c_str() : nullptr;
+}
 
 void HX_PROPERTY::set_int(int32_t value) {
     if (kind_ == HX_PROP_INT) int_ = value;
@@ -157,7 +169,8 @@ bool HX_PROPERTY::same_value(const HX_PROPERTY& other) const {
 // --- HX_PROPLIST -------------------------------------------------------------
 
 HX_PROPLIST::~HX_PROPLIST() {
-    for (HX_PROPERTY* prop : items_) delete prop;
+    for (HX_PROPERTY* prop : items_)
+        delete prop;
 }
 
 namespace {
@@ -294,7 +307,9 @@ HX_PROPERTY* HX_OBJECT::find_prop(const char* name) const {
     return props_ ? props_->find(name) : nullptr;
 }
 
-bool HX_OBJECT::delete_prop(HX_PROPERTY* prop) { return props_ && props_->remove(prop); }
+bool HX_OBJECT::delete_prop(HX_PROPERTY* prop) {
+    return props_ && props_->remove(prop);
+}
 
 bool HX_OBJECT::delete_prop(const char* name, uint8_t ignore_case) {
     if (props_ == nullptr || name == nullptr) return false;

@@ -3,6 +3,7 @@
 // Private to the database.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
@@ -37,26 +38,149 @@ class HX_ARENA {
     std::size_t reserved_ = 0;
 };
 
-/// Open-addressing table of networks keyed by tag (linear probing,
-/// backward-shift removal): 8 bytes a slot, at most half full.
+/// Networks by tag. Tags are handed out in rising order, so most sit in a
+/// plain array indexed by tag, which also keeps neighbouring tags close in
+/// memory. The array never grows beyond about twice the number of networks;
+/// tags beyond it (from a file, say) go to an open-addressing table (linear
+/// probing, backward-shift removal, at most half full). `Net` is anything
+/// with get_tag(); the database uses HX_NETWORK.
+template <class Net = HX_NETWORK>
 class HX_TAG_TABLE {
   public:
-    HX_NETWORK* find(uint32_t tag) const;
+    Net* find(uint32_t tag) const;
     /// False when the tag is taken.
-    bool insert(HX_NETWORK* net);
+    bool insert(Net* net);
     void erase(uint32_t tag);
     std::size_t size() const { return used_; }
     /// The largest tag ever inserted.
     uint32_t max_tag() const { return max_tag_; }
 
   private:
+    bool grow_dense(uint32_t tag);
+    Net* find_sparse(uint32_t tag) const;
+    bool insert_sparse(Net* net);
+    void erase_sparse(uint32_t tag);
     std::size_t home(uint32_t tag) const;
     void rehash(std::size_t capacity);
 
-    std::vector<HX_NETWORK*> slots_;
-    std::size_t used_ = 0;
+    std::vector<Net*> dense_;
+    std::vector<Net*> slots_;
+    std::size_t used_ = 0;         // networks in both parts
+    std::size_t sparse_used_ = 0;  // networks in the open-addressing part
     uint32_t max_tag_ = 0;
 };
+
+template <class Net>
+Net* HX_TAG_TABLE<Net>::find(uint32_t tag) const {
+    if (tag < dense_.size()) return dense_[tag];
+    return sparse_used_ > 0 ? find_sparse(tag) : nullptr;
+}
+
+template <class Net>
+bool HX_TAG_TABLE<Net>::insert(Net* net) {
+    const uint32_t tag = net->get_tag();
+    if (tag >= dense_.size() && !grow_dense(tag)) {
+        if (!insert_sparse(net)) return false;
+    } else {
+        if (dense_[tag] != nullptr) return false;
+        dense_[tag] = net;
+    }
+    ++used_;
+    max_tag_ = std::max(max_tag_, tag);
+    return true;
+}
+
+template <class Net>
+void HX_TAG_TABLE<Net>::erase(uint32_t tag) {
+    if (tag < dense_.size()) {
+        if (dense_[tag] == nullptr) return;
+        dense_[tag] = nullptr;
+        --used_;
+    } else if (sparse_used_ > 0 && find_sparse(tag) != nullptr) {
+        erase_sparse(tag);
+        --used_;
+    }
+}
+
+// Makes the array reach `tag` when that keeps it within about twice the
+// number of networks; moves the networks it now covers out of the table.
+template <class Net>
+bool HX_TAG_TABLE<Net>::grow_dense(uint32_t tag) {
+    const std::size_t limit = 2 * (used_ + 1) + 4096;
+    if (tag >= limit) return false;
+    const std::size_t size =
+        std::min(limit, std::max<std::size_t>(tag + std::size_t{1}, dense_.size() * 2));
+    dense_.resize(size, nullptr);
+    if (sparse_used_ == 0) return true;
+    std::vector<Net*> covered;
+    for (Net* net : slots_) {
+        if (net != nullptr && net->get_tag() < size) covered.push_back(net);
+    }
+    for (Net* net : covered) {
+        erase_sparse(net->get_tag());
+        dense_[net->get_tag()] = net;
+    }
+    return true;
+}
+
+template <class Net>
+std::size_t HX_TAG_TABLE<Net>::home(uint32_t tag) const {
+    return (static_cast<uint64_t>(tag) * 0x9E3779B97F4A7C15ull >> 20) & (slots_.size() - 1);
+}
+
+template <class Net>
+Net* HX_TAG_TABLE<Net>::find_sparse(uint32_t tag) const {
+    if (slots_.empty()) return nullptr;
+    for (std::size_t i = home(tag);; i = (i + 1) & (slots_.size() - 1)) {
+        Net* net = slots_[i];
+        if (net == nullptr || net->get_tag() == tag) return net;
+    }
+}
+
+template <class Net>
+bool HX_TAG_TABLE<Net>::insert_sparse(Net* net) {
+    if ((sparse_used_ + 1) * 2 > slots_.size())
+        rehash(std::max<std::size_t>(16, slots_.size() * 2));
+    for (std::size_t i = home(net->get_tag());; i = (i + 1) & (slots_.size() - 1)) {
+        if (slots_[i] == nullptr) {
+            slots_[i] = net;
+            ++sparse_used_;
+            return true;
+        }
+        if (slots_[i]->get_tag() == net->get_tag()) return false;
+    }
+}
+
+template <class Net>
+void HX_TAG_TABLE<Net>::erase_sparse(uint32_t tag) {
+    std::size_t mask = slots_.size() - 1;
+    std::size_t i = home(tag);
+    while (slots_[i] != nullptr && slots_[i]->get_tag() != tag)
+        i = (i + 1) & mask;
+    if (slots_[i] == nullptr) return;
+    slots_[i] = nullptr;
+    --sparse_used_;
+    // Shift back the entries of the run behind the hole that may no longer
+    // be reachable from their home slot.
+    for (std::size_t j = (i + 1) & mask; slots_[j] != nullptr; j = (j + 1) & mask) {
+        std::size_t h = home(slots_[j]->get_tag());
+        if (((j - h) & mask) >= ((j - i) & mask)) {
+            slots_[i] = slots_[j];
+            slots_[j] = nullptr;
+            i = j;
+        }
+    }
+}
+
+template <class Net>
+void HX_TAG_TABLE<Net>::rehash(std::size_t capacity) {
+    std::vector<Net*> old(capacity, nullptr);
+    old.swap(slots_);
+    sparse_used_ = 0;
+    for (Net* net : old) {
+        if (net != nullptr) insert_sparse(net);
+    }
+}
 
 /// Index of a block's pin names, kept for blocks with many pins and dropped
 /// when one of their pins is renamed.
@@ -65,6 +189,6 @@ using HX_PIN_NAME_INDEX = std::unordered_map<std::string_view, uint16_t>;
 struct HX_DESIGN_STORAGE {
     HX_ARENA objects;
     HX_ARENA text;
-    HX_TAG_TABLE tags;
+    HX_TAG_TABLE<> tags;
     std::unordered_map<const HX_BLOCK*, HX_PIN_NAME_INDEX> pin_names;
 };

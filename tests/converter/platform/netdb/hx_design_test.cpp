@@ -1,16 +1,20 @@
 #include <gtest/gtest.h>
 
+#include <map>
+#include <random>
 #include <string>
 #include <vector>
 
 #include "hx_library.h"
+#include "hx_storage.h"
 
 namespace {
 
 template <class Iter, class T = std::remove_pointer_t<decltype(std::declval<Iter>().l_next())>>
 std::vector<T*> drain(Iter* iter) {
     std::vector<T*> out;
-    while (T* item = iter->l_next()) out.push_back(item);
+    while (T* item = iter->l_next())
+        out.push_back(item);
     delete iter;
     return out;
 }
@@ -19,7 +23,8 @@ std::vector<std::string> prop_names(const HX_OBJECT& object) {
     std::vector<std::string> names;
     auto* iter = object.create_prop_iter();
     if (iter == nullptr) return names;
-    while (HX_PROPERTY* prop = iter->l_next()) names.emplace_back(prop->get_name());
+    while (HX_PROPERTY* prop = iter->l_next())
+        names.emplace_back(prop->get_name());
     object.delete_prop_iter(iter);
     return names;
 }
@@ -49,7 +54,8 @@ TEST_F(DesignTest, PropertiesKeepOrderReplaceInPlaceAndGoLastWhenRemade) {
 
 TEST_F(DesignTest, PropertyWalkMayDeleteThePropertyItStandsOn) {
     HX_LOGBLOCK* root = design->create_logblock(nullptr, 0, "top");
-    for (const char* name : {"P0", "P1", "P2", "P3"}) root->create_prop(name, 0);
+    for (const char* name : {"P0", "P1", "P2", "P3"})
+        root->create_prop(name, 0);
     std::vector<std::string> seen;
     auto* iter = root->create_prop_iter();
     while (HX_PROPERTY* prop = iter->l_next()) {
@@ -61,7 +67,8 @@ TEST_F(DesignTest, PropertyWalkMayDeleteThePropertyItStandsOn) {
     }
     root->delete_prop_iter(iter);
     // Appends made during the walk are visited too.
-    EXPECT_EQ(seen, (std::vector<std::string>{"P0", "P1", "P2", "P3", "NP0", "NP2", "NNP0", "NNNP0"}));
+    EXPECT_EQ(seen,
+              (std::vector<std::string>{"P0", "P1", "P2", "P3", "NP0", "NP2", "NNP0", "NNNP0"}));
     EXPECT_EQ(prop_names(*root), (std::vector<std::string>{"P1", "P3", "NP2", "NNNP0"}));
 }
 
@@ -82,7 +89,8 @@ TEST_F(DesignTest, PrimitivesGetTheirPinLayout) {
     ASSERT_NE(ramd, nullptr);
     HX_PRIMITIVE* prim = ramd->get_primitive();
     std::vector<std::string> names;
-    for (uint16_t i = 0; i < prim->get_pin_count(); ++i) names.emplace_back(prim->get_prim_pin(i)->get_name());
+    for (uint16_t i = 0; i < prim->get_pin_count(); ++i)
+        names.emplace_back(prim->get_prim_pin(i)->get_name());
     EXPECT_EQ(names, (std::vector<std::string>{"IN", "WADR0", "WADR1", "RADR0", "RADR1", "CLK",
                                                "CE", "OUT"}));
     EXPECT_EQ(prim->get_prim_index(HX_PPIN_RADR, 1), 4);
@@ -100,7 +108,8 @@ TEST_F(DesignTest, PrimitivesGetTheirPinLayout) {
     EXPECT_EQ(tri->get_primitive()->get_width(), HX_NO_INDEX);
     EXPECT_EQ(tri->get_pin(2)->get_dir(), HX_PIN_TRI);
     EXPECT_EQ(tri->get_pin(2)->get_role(), HX_PPIN_OUT);
-    EXPECT_EQ(design->create_logprim(root, HX_PRIM_PAD, 0, nullptr)->get_pin(0)->get_dir(), HX_PIN_BI);
+    EXPECT_EQ(design->create_logprim(root, HX_PRIM_PAD, 0, nullptr)->get_pin(0)->get_dir(),
+              HX_PIN_BI);
     EXPECT_EQ(design->create_logprim(root, HX_PRIM_AND, HX_NO_INDEX, nullptr), nullptr);
     EXPECT_EQ(design->create_logprim(root, 19, 0, nullptr), nullptr);
     EXPECT_EQ(design->create_logprim(root, HX_PRIM_RAMD, 40000, nullptr), nullptr);
@@ -128,7 +137,8 @@ TEST_F(DesignTest, OneRootPerKindAndChildrenInOrder) {
 
 TEST_F(DesignTest, FindPinAndCheckPinsFollowRenames) {
     HX_LOGBLOCK* root = design->create_logblock(nullptr, 40, "top");
-    for (uint16_t i = 0; i < 40; ++i) root->get_pin(i)->set_name(("p" + std::to_string(i)).c_str());
+    for (uint16_t i = 0; i < 40; ++i)
+        root->get_pin(i)->set_name(("p" + std::to_string(i)).c_str());
     EXPECT_EQ(root->find_pin("p33", 0), 33);
     EXPECT_TRUE(root->check_pins(0));
     root->get_pin(33)->set_name("q");
@@ -158,10 +168,10 @@ TEST_F(DesignTest, NetworksJoinThroughPinsAndKeepTheHighestSignalsTag) {
     EXPECT_EQ(design->network_count(), 2u);
 
     ASSERT_NE(design->create_conn(m, g, 0), nullptr);
-    ASSERT_NE(design->create_conn(m, u1, 0), nullptr);  // inner side of u1's pin
-    EXPECT_EQ(design->create_conn(m, u1, 0), nullptr);  // side taken
+    ASSERT_NE(design->create_conn(m, u1, 0), nullptr);   // inner side of u1's pin
+    EXPECT_EQ(design->create_conn(m, u1, 0), nullptr);   // side taken
     EXPECT_EQ(design->create_conn(m, top, 0), nullptr);  // top has no pin 0
-    ASSERT_NE(design->create_conn(n, u1, 0), nullptr);  // outer side: joins the nets
+    ASSERT_NE(design->create_conn(n, u1, 0), nullptr);   // outer side: joins the nets
     EXPECT_EQ(u1->get_pin(0)->get_inner_signal(), m);
     EXPECT_EQ(u1->get_pin(0)->get_outer_signal(), n);
 
@@ -256,7 +266,8 @@ TEST_F(DesignTest, MergeSignalsMovesEveryConnectionToTheGlobal) {
     EXPECT_EQ(top->get_pin(0)->get_inner_signal(), vcc);
     std::vector<HX_BLOCK*> blocks;
     auto* conns = vcc->create_conn_iter();
-    while (HX_CONN* c = conns->l_next()) blocks.push_back(c->get_block());
+    while (HX_CONN* c = conns->l_next())
+        blocks.push_back(c->get_block());
     vcc->delete_conn_iter(conns);
     EXPECT_EQ(blocks, (std::vector<HX_BLOCK*>{a, b, top}));
     EXPECT_EQ(drain(top->create_signal_iter()), (std::vector<HX_SIGNAL*>{other}));
@@ -284,7 +295,8 @@ TEST_F(DesignTest, MapSignalsAndPhysicalParents) {
     EXPECT_EQ(u1->get_pin(0)->get_map_signal(), m);
     std::vector<HX_BLOCK*> ends;
     auto* conns = m->create_conn_iter();
-    while (HX_CONN* c = conns->l_next()) ends.push_back(c->get_block());
+    while (HX_CONN* c = conns->l_next())
+        ends.push_back(c->get_block());
     m->delete_conn_iter(conns);
     EXPECT_EQ(ends, (std::vector<HX_BLOCK*>{slot, u1}));
 
@@ -389,6 +401,51 @@ TEST(LibraryTest, NamesAndAliasesFollowTheCaseSenseFlag) {
     EXPECT_FALSE(lib.set_casesense(0));  // Cpu and cpu would become one name
     EXPECT_EQ(lib.get_casesense(), 1);
     EXPECT_EQ(drain(lib.create_liblink_iter()).size(), 2u);
+}
+
+}  // namespace
+
+namespace {
+
+struct FakeNet {
+    uint32_t tag;
+    uint32_t get_tag() const { return tag; }
+};
+
+// Tags come mostly in rising order, but files may bring any: the table must
+// agree with a plain map whichever part (array or hashed) holds a tag, also
+// while the array grows over tags that were hashed before.
+TEST(TagTableTest, AgreesWithAMapForDenseAndSparseTags) {
+    std::mt19937 random(7);
+    std::vector<std::unique_ptr<FakeNet>> nets;
+    std::map<uint32_t, FakeNet*> expected;
+    HX_TAG_TABLE<FakeNet> table;
+    uint32_t next = 1;
+    for (int step = 0; step < 20000; ++step) {
+        const int action = static_cast<int>(random() % 10);
+        uint32_t tag = action < 5   ? next++
+                       : action < 7 ? static_cast<uint32_t>(random() % 20000)
+                                    : static_cast<uint32_t>(random());
+        if (action == 9 && !expected.empty()) {
+            auto it = expected.begin();
+            std::advance(it, random() % expected.size());
+            table.erase(it->first);
+            expected.erase(it);
+            continue;
+        }
+        nets.push_back(std::make_unique<FakeNet>(FakeNet{tag}));
+        const bool fresh = !expected.contains(tag);
+        ASSERT_EQ(table.insert(nets.back().get()), fresh) << "tag " << tag;
+        if (fresh) expected.emplace(tag, nets.back().get());
+    }
+    EXPECT_EQ(table.size(), expected.size());
+    for (const auto& [tag, net] : expected)
+        ASSERT_EQ(table.find(tag), net) << "tag " << tag;
+    for (uint32_t probe = 0; probe < 30000; ++probe) {
+        if (!expected.contains(probe)) {
+            ASSERT_EQ(table.find(probe), nullptr) << "tag " << probe;
+        }
+    }
 }
 
 }  // namespace
