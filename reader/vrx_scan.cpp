@@ -168,13 +168,6 @@ std::size_t refill(char*& keep) {
 
 // --- Tokens ------------------------------------------------------------------
 
-// The one place that moves `line_number`. It stops at INT32_MAX rather than
-// overflow on an input of more than two thousand million lines.
-inline void add_lines(int64_t lines) {
-    const int64_t line = line_number + lines;
-    line_number = line < INT32_MAX ? static_cast<int32_t>(line) : INT32_MAX;
-}
-
 // At a CR at `p`: true when a line feed follows, which makes the CR part of
 // the line end: it is skipped and never part of a token. Refills, keeping the
 // bytes from `keep` on, when the CR is the last byte buffered; `p` follows.
@@ -305,7 +298,7 @@ bool scan_quoted(char* tok) {
     }
     char* text = tok + 1;
     const std::size_t length = drop_crs(text, p);
-    add_lines(count_line_ends(text, text + length));
+    vrx_add_lines(count_line_ends(text, text + length));
     vrx_scan_cur = p + 1;
     if (length + 2 > VX_MAX_TEXT) {
         too_long();
@@ -349,7 +342,7 @@ char* skip_space(char* p) {
         } else {
             return p;
         }
-        add_lines(1);
+        vrx_add_lines(1);
     }
 }
 

@@ -253,6 +253,13 @@ inline VX_TOKEN vrx_number_token(char* tok) {
     return VX_TOK_NUMBER;
 }
 
+/// The one place that moves `line_number`. It stops at INT32_MAX rather than
+/// overflow on an input of more than two thousand million lines.
+inline void vrx_add_lines(int64_t lines) {
+    const int64_t line = line_number + lines;
+    line_number = line < INT32_MAX ? static_cast<int32_t>(line) : INT32_MAX;
+}
+
 /// Reads the next token from the current input.
 [[gnu::always_inline]] inline VX_TOKEN vrx_next_token() {
     char* p = vrx_scan_cur;
@@ -263,7 +270,7 @@ inline VX_TOKEN vrx_number_token(char* tok) {
                 ++p;
                 [[fallthrough]];
             case VX_BC_LINE_END:
-                if (line_number < INT32_MAX) ++line_number;
+                vrx_add_lines(1);
                 [[fallthrough]];
             case VX_BC_BLANK:  // the whole run: one dispatch per blank costs more
                 do

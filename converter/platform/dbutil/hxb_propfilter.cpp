@@ -51,7 +51,7 @@ const char* check_name(std::string_view name, bool& prefix) {
 
 }  // namespace
 
-Hxb_PropFilter::Hxb_PropFilter(const char* file, Hxb_PropFiltStatus* status, PM_SPEC* /*spec*/,
+Hxb_PropFilter::Hxb_PropFilter(const char* file, Hxb_PropFiltStatus* status, PM_SPEC* /*device*/,
                                Direction direction)
     : direction_(direction) {
     status_ = read(file);

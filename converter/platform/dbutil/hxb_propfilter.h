@@ -43,9 +43,9 @@ class Hxb_PropFilter {
 
     /// Reads the rules of `file` and sets `*status` (when given). A filter
     /// whose file was not read in full has no rules and passes everything.
-    /// `spec`, the device the properties belong to, may be null; the rules do
+    /// `device`, the device the properties belong to, may be null; the rules do
     /// not depend on it.
-    Hxb_PropFilter(const char* file, Hxb_PropFiltStatus* status, PM_SPEC* spec,
+    Hxb_PropFilter(const char* file, Hxb_PropFiltStatus* status, PM_SPEC* device,
                    Direction direction);
     ~Hxb_PropFilter();
     Hxb_PropFilter(const Hxb_PropFilter&) = delete;

@@ -3,15 +3,16 @@
 #include <sys/mman.h>
 
 #include <algorithm>
-#include <cctype>
 #include <cstdlib>
 #include <cstring>
 #include <new>
 #include <string>
+#include <type_traits>
 #include <unordered_set>
 
 #include "hx_prim_layout.h"
 #include "hx_storage.h"
+#include "ut_str.h"
 
 namespace {
 
@@ -22,15 +23,6 @@ const std::vector<HX_SIGNAL*> kNoSignals;
 constexpr std::size_t kPinHeader = sizeof(HX_BLOCK*);
 // Blocks with more pins than this get a name index for find_pin.
 constexpr uint16_t kIndexedPinCount = 16;
-
-bool equal_ignore_case(const char* a, const char* b) {
-    for (; *a && *b; ++a, ++b) {
-        if (std::tolower(static_cast<unsigned char>(*a)) !=
-            std::tolower(static_cast<unsigned char>(*b)))
-            return false;
-    }
-    return *a == *b;
-}
 
 // Rank of a signal for the highest-signal rule: lower is nearer the root.
 int64_t signal_rank(const HX_SIGNAL* signal) {
@@ -160,7 +152,8 @@ uint16_t HX_BLOCK::find_pin(const char* name, uint8_t ignore_case) const {
         for (uint16_t i = 0; i < pin_count_; ++i) {
             const char* pin_name = pins_[i].name_;
             if (pin_name == nullptr) continue;
-            if (ignore_case ? equal_ignore_case(pin_name, name) : std::strcmp(pin_name, name) == 0)
+            if (ignore_case ? UT_STR::EqualNoCase(pin_name, name)
+                            : std::strcmp(pin_name, name) == 0)
                 return i;
         }
         return HX_NO_INDEX;
@@ -183,11 +176,10 @@ bool HX_BLOCK::check_pins(uint8_t require_names) const {
         }
     }
     if (is_primitive()) return true;
-    std::unordered_set<std::string_view> seen;
-    seen.reserve(pin_count_);
+    // A name shared by two pins is the first pin found for it by another index.
     for (uint16_t i = 0; i < pin_count_; ++i) {
         const char* name = pins_[i].name_;
-        if (name != nullptr && *name != '\0' && !seen.insert(name).second) return false;
+        if (name != nullptr && *name != '\0' && find_pin(name, 0) != i) return false;
     }
     return true;
 }
@@ -420,17 +412,32 @@ const char* HX_DESIGN::intern(const char* text) {
 
 // --- the design: blocks ------------------------------------------------------
 
+// Makes a block of kind T under `parent`, or the root of T's kind when the
+// parent is null. Null when that root exists already, or when the parent is
+// a primitive or belongs to another design.
 template <class T, class... Args>
 T* HX_DESIGN::make_block(HX_BLOCK* parent, uint16_t pin_count, const char* name, Args&&... args) {
+    constexpr bool physical = std::is_base_of_v<HX_BASEPHYSBLOCK, T>;
+    constexpr bool primitive = std::is_base_of_v<HX_PRIMITIVE, T>;
+    HX_BLOCK* root = physical ? static_cast<HX_BLOCK*>(phys_root_) : log_root_;
+    if (parent == nullptr ? root != nullptr : !owns(parent) || parent->is_primitive())
+        return nullptr;
     void* memory = store_->objects.alloc(sizeof(T), alignof(T));
     T* block = new (memory) T(std::forward<Args>(args)...);
     block->design_ = this;
     block->parent_ = parent;
     block->name_ = intern(name);
+    block->flags_ = (physical ? HX_BLK_PHYSICAL : 0) | (primitive ? HX_BLK_PRIMITIVE : 0);
     block->pin_count_ = pin_count;
     block->pins_ = make_pins(block, pin_count);
     blocks_.push_back(block);
-    if (parent != nullptr) parent->lists().children.push_back(block);
+    if (parent != nullptr) {
+        parent->lists().children.push_back(block);
+    } else if constexpr (physical) {
+        phys_root_ = block;
+    } else {
+        log_root_ = block;
+    }
     return block;
 }
 
@@ -458,52 +465,34 @@ void HX_DESIGN::make_prim_pins(HX_BLOCK* block, HX_PRIMITIVE* prim) {
         });
 }
 
+template <class T>
+T* HX_DESIGN::make_prim(HX_BLOCK* parent, int32_t type, uint16_t width, const char* name) {
+    if (!hx_prim_takes_width(type)) width = HX_NO_INDEX;
+    const uint32_t count = hx_prim_pin_count(type, width);
+    if (count == 0) return nullptr;
+    T* prim = make_block<T>(parent, static_cast<uint16_t>(count), name, static_cast<uint8_t>(type),
+                            width);
+    if (prim != nullptr) make_prim_pins(prim, prim);
+    return prim;
+}
+
 HX_LOGBLOCK* HX_DESIGN::create_logblock(HX_BASELOGBLOCK* parent, uint16_t width, const char* name) {
-    if (parent == nullptr ? log_root_ != nullptr : !owns(parent) || parent->is_primitive())
-        return nullptr;
-    HX_LOGBLOCK* block = make_block<HX_LOGBLOCK>(parent, width, name);
-    if (parent == nullptr) log_root_ = block;
-    return block;
+    return make_block<HX_LOGBLOCK>(parent, width, name);
 }
 
 HX_PHYSBLOCK* HX_DESIGN::create_physblock(HX_BASEPHYSBLOCK* parent, uint16_t width,
                                           const char* name) {
-    if (parent == nullptr ? phys_root_ != nullptr : !owns(parent) || parent->is_primitive())
-        return nullptr;
-    HX_PHYSBLOCK* block = make_block<HX_PHYSBLOCK>(parent, width, name);
-    block->flags_ = HX_BLK_PHYSICAL;
-    if (parent == nullptr) phys_root_ = block;
-    return block;
+    return make_block<HX_PHYSBLOCK>(parent, width, name);
 }
 
 HX_LOGPRIM* HX_DESIGN::create_logprim(HX_BASELOGBLOCK* parent, int32_t type, uint16_t width,
                                       const char* name) {
-    if (parent == nullptr ? log_root_ != nullptr : !owns(parent) || parent->is_primitive())
-        return nullptr;
-    if (!hx_prim_takes_width(type)) width = HX_NO_INDEX;
-    uint32_t count = hx_prim_pin_count(type, width);
-    if (count == 0) return nullptr;
-    auto* prim = make_block<HX_LOGPRIM>(parent, static_cast<uint16_t>(count), name,
-                                        static_cast<uint8_t>(type), width);
-    prim->flags_ = HX_BLK_PRIMITIVE;
-    make_prim_pins(prim, prim);
-    if (parent == nullptr) log_root_ = prim;
-    return prim;
+    return make_prim<HX_LOGPRIM>(parent, type, width, name);
 }
 
 HX_PHYSPRIM* HX_DESIGN::create_physprim(HX_BASEPHYSBLOCK* parent, int32_t type, uint16_t width,
                                         const char* name) {
-    if (parent == nullptr ? phys_root_ != nullptr : !owns(parent) || parent->is_primitive())
-        return nullptr;
-    if (!hx_prim_takes_width(type)) width = HX_NO_INDEX;
-    uint32_t count = hx_prim_pin_count(type, width);
-    if (count == 0) return nullptr;
-    auto* prim = make_block<HX_PHYSPRIM>(parent, static_cast<uint16_t>(count), name,
-                                         static_cast<uint8_t>(type), width);
-    prim->flags_ = HX_BLK_PHYSICAL | HX_BLK_PRIMITIVE;
-    make_prim_pins(prim, prim);
-    if (parent == nullptr) phys_root_ = prim;
-    return prim;
+    return make_prim<HX_PHYSPRIM>(parent, type, width, name);
 }
 
 UT_BLIST_ITER<HX_BLOCK>* HX_DESIGN::create_block_iter() const {
@@ -739,8 +728,7 @@ bool HX_DESIGN::merge_signals(HX_SIGNAL* global, HX_SIGNAL*& signal, uint8_t kee
         }
         old->last_conn_ = nullptr;
     }
-    join_networks(global->network_, old->network_);
-    unlink_member(old);
+    leave_network_for(old, global->network_);
     if (!drop_props) global->copy_properties(old->get_props(), 0);
     if (keep_signal) {
         make_network(old, next_tag());
@@ -749,6 +737,23 @@ bool HX_DESIGN::merge_signals(HX_SIGNAL* global, HX_SIGNAL*& signal, uint8_t kee
     }
     signal = global;
     return true;
+}
+
+// Takes `signal` out of its network and joins what is left of that network
+// to `net`. The signal leaves its own network before the join, so that the
+// walk to its place in the member ring covers only that network, not the
+// one it joins (a global net may gather thousands of merged signals).
+void HX_DESIGN::leave_network_for(HX_SIGNAL* signal, HX_NETWORK* net) {
+    HX_NETWORK* own = signal->network_;
+    if (own == net) {
+        unlink_member(signal);
+    } else if (own->members_ == 1) {
+        net->copy_properties(own->get_props(), 0);
+        unlink_member(signal);  // drops `own`
+    } else {
+        unlink_member(signal);
+        join_networks(net, own);
+    }
 }
 
 void HX_DESIGN::delete_signal(HX_SIGNAL* signal) {

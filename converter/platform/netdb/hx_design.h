@@ -496,6 +496,8 @@ class HX_DESIGN : public HX_OBJECT {
 
     template <class T, class... Args>
     T* make_block(HX_BLOCK* parent, uint16_t pin_count, const char* name, Args&&... args);
+    template <class T>
+    T* make_prim(HX_BLOCK* parent, int32_t type, uint16_t width, const char* name);
     HX_PIN* make_pins(HX_BLOCK* block, uint16_t count);
     void make_prim_pins(HX_BLOCK* block, HX_PRIMITIVE* prim);
     HX_SIGNAL* make_signal(const char* name);
@@ -509,6 +511,7 @@ class HX_DESIGN : public HX_OBJECT {
     void exchange_identity(HX_NETWORK* x, HX_NETWORK* y);
     void drop_network(HX_NETWORK* net);
     void unlink_member(HX_SIGNAL* signal);
+    void leave_network_for(HX_SIGNAL* signal, HX_NETWORK* net);
     void delete_signal(HX_SIGNAL* signal);
     void rename_global(HX_SIGNAL* signal, const char* name);
     bool owns(const HX_BLOCK* block) const { return block && block->design_ == this; }

@@ -1,7 +1,8 @@
 #include "hx_library.h"
 
 #include <algorithm>
-#include <cctype>
+
+#include "ut_str.h"
 
 HX_ENVIRONMENT hx_env;
 
@@ -23,12 +24,7 @@ void HX_LIBRARY::set_name(const char* name) {
 }
 
 std::string HX_LIBRARY::key_of(const char* name) const {
-    std::string key(name);
-    if (!casesense_) {
-        std::transform(key.begin(), key.end(), key.begin(),
-                       [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
-    }
-    return key;
+    return casesense_ ? std::string(name) : UT_STR::FoldCase(name);
 }
 
 HX_DESIGN* HX_LIBRARY::create_design(const char* name) {

@@ -1,9 +1,10 @@
 #include "hx_property.h"
 
 #include <algorithm>
-#include <cctype>
 #include <cstring>
 #include <string_view>
+
+#include "ut_str.h"
 
 namespace {
 
@@ -38,15 +39,6 @@ constexpr PredefinedName kPredefined[] = {
 
 bool holds_text(HX_PROP_TYPE kind) {
     return kind == HX_PROP_STRING || kind == HX_PROP_PARAM || kind == HX_PROP_TIMINGSTR;
-}
-
-bool equal_ignore_case(const char* a, const char* b) {
-    for (; *a && *b; ++a, ++b) {
-        if (std::tolower(static_cast<unsigned char>(*a)) !=
-            std::tolower(static_cast<unsigned char>(*b)))
-            return false;
-    }
-    return *a == *b;
 }
 
 }  // namespace
@@ -315,7 +307,7 @@ bool HX_OBJECT::delete_prop(const char* name, uint8_t ignore_case) {
     if (props_ == nullptr || name == nullptr) return false;
     if (!ignore_case) return props_->remove(props_->find(name));
     for (HX_PROPERTY* prop : props_->items()) {
-        if (prop != nullptr && equal_ignore_case(prop->get_name(), name))
+        if (prop != nullptr && UT_STR::EqualNoCase(prop->get_name(), name))
             return props_->remove(prop);
     }
     return false;

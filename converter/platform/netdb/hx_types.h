@@ -13,7 +13,7 @@ enum HX_PROP_TYPE : int32_t {
     HX_PROP_TIMING = 5,     // HX_PROP_TIMING_DATA
     HX_PROP_PINREF = 6,     // HX_PROP_PINREF_DATA
     HX_PROP_PARAM = 7,      // parameter name (text)
-    HX_PROP_TIMINGSTR = 8,  // timing specification kept as text
+    HX_PROP_TIMINGSTR = 8,  // timing constraint kept as text
 };
 inline constexpr int HX_PROP_TYPE_COUNT = 9;
 

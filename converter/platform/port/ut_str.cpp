@@ -25,6 +25,26 @@ bool UT_STR::ContainsChar(const char* s, char c) {
     return s != nullptr && c != '\0' && std::strchr(s, c) != nullptr;
 }
 
+namespace {
+char fold(char c) {
+    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+}
+}  // namespace
+
+bool UT_STR::EqualNoCase(const char* a, const char* b) {
+    if (a == nullptr || b == nullptr) return a == b;
+    for (; *a != '\0' && fold(*a) == fold(*b); ++a, ++b) {
+    }
+    return fold(*a) == fold(*b);
+}
+
+std::string UT_STR::FoldCase(const char* s) {
+    std::string folded = s ? s : "";
+    for (char& c : folded)
+        c = fold(c);
+    return folded;
+}
+
 bool UT_STR::Copy(char* dst, std::size_t size, const char* src) {
     if (size == 0) return src == nullptr || *src == '\0';
     dst[0] = '\0';

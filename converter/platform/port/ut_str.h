@@ -27,6 +27,10 @@ class UT_STR {
     /// Byte count without the terminator; 0 for an absent text.
     static std::size_t Len(const char* s);
     static bool ContainsChar(const char* s, char c);
+    /// Equal when ASCII letters are compared without regard to case.
+    static bool EqualNoCase(const char* a, const char* b);
+    /// A copy with ASCII capitals made small (empty for an absent text).
+    static std::string FoldCase(const char* s);
 
     /// Copies src into dst (size bytes, terminator included). Returns false,
     /// with dst holding the truncated text, when src does not fit.

@@ -1,15 +1,11 @@
 #include "ut_nch_cache.h"
 
+#include "ut_str.h"
+
 UT_NCH_CACHE::UT_NCH_CACHE(int flag) : fold_case_(flag != 0) {}
 
 std::string UT_NCH_CACHE::key_of(const char* name) const {
-    std::string key = name ? name : "";
-    if (fold_case_) {
-        for (char& c : key) {
-            if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-        }
-    }
-    return key;
+    return fold_case_ ? UT_STR::FoldCase(name) : std::string(name ? name : "");
 }
 
 bool UT_NCH_CACHE::add(const char* name, std::intptr_t value) {

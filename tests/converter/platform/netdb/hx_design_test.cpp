@@ -278,6 +278,31 @@ TEST_F(DesignTest, MergeSignalsMovesEveryConnectionToTheGlobal) {
     EXPECT_EQ(drain(top->create_global_siglist(1)), (std::vector<HX_SIGNAL*>{vcc}));
 }
 
+// A merged signal whose net runs on into a child block: the rest of that net
+// joins the global signal's network, which keeps the global's tag.
+TEST_F(DesignTest, MergeSignalsBringsTheRestOfTheNetAlong) {
+    HX_LOGBLOCK* top = design->create_logblock(nullptr, 0, "top");
+    HX_LOGBLOCK* u1 = design->create_logblock(top, 1, "u1");
+    HX_SIGNAL* n = design->create_signal(top, "n");
+    HX_SIGNAL* m = design->create_signal(u1, "m");
+    design->create_conn(m, u1, 0);
+    design->create_conn(n, u1, 0);
+    n->get_network()->create_prop("FROM_N", 1);
+    HX_SIGNAL* vcc = design->create_global_signal("vcc");
+    const uint32_t global_tag = vcc->get_network()->get_tag();
+
+    HX_SIGNAL* ref = n;
+    ASSERT_TRUE(design->merge_signals(vcc, ref, 0, 0));
+    HX_NETWORK* net = vcc->get_network();
+    EXPECT_EQ(m->get_network(), net);
+    EXPECT_EQ(net->get_tag(), global_tag);
+    EXPECT_EQ(net->get_highest_signal(), vcc);
+    EXPECT_EQ(net->get_member_count(), 2u);
+    EXPECT_NE(net->find_prop("FROM_N"), nullptr);
+    EXPECT_EQ(u1->get_pin(0)->get_outer_signal(), vcc);
+    EXPECT_EQ(drain(design->create_network_iter()), (std::vector<HX_NETWORK*>{net}));
+}
+
 TEST_F(DesignTest, MapSignalsAndPhysicalParents) {
     HX_LOGBLOCK* top = design->create_logblock(nullptr, 0, "top");
     HX_LOGBLOCK* u1 = design->create_logblock(top, 2, "u1");
