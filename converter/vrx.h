@@ -19,8 +19,10 @@
 #include "ut_btr_tree.h"
 #include "ut_ptrfile.h"
 #include "vrx_parser.h"
+#include "vx_token.h"
 
 class Hxb_PropFilter;
+class HX_PROPERTY;
 
 /// Result of the public conversion operations.
 enum VX_STATUS : int32_t {
@@ -63,6 +65,21 @@ class VRX {
     HX_DESIGN* get_design() const { return design; }
     HX_LIBRARY* get_library() const { return library; }
 
+    // --- Database to text -----------------------------------------------------
+
+    /// Loads the design (.hxb) or library (.hxl) file at `path` through the
+    /// database environment and selects it for vrx_write. VX_FILE_ERROR, with
+    /// an error message, when the file cannot be opened, is not a database
+    /// file, or is refused by the database; what was loaded before stays.
+    VX_STATUS hxb_read(const char* path);
+    /// Writes what hxb_read (or vrx_read) loaded as a text netlist at `path`.
+    /// `filter_file` names a property filter that every written property
+    /// passes through (null keeps the filter of an earlier call);
+    /// `omit_user` leaves out the USER flag of blocks. The text goes to a
+    /// temporary file first; `path` is replaced only by a complete file, and
+    /// every failure leaves it untouched and removes the temporary file.
+    VX_STATUS vrx_write(const char* path, const char* filter_file, uint8_t omit_user);
+
   private:
     friend void vrx_do_library_props(VX_PROP_ARRAY*);
     friend void vrx_begin_design(const char*, VX_PROP_ARRAY*);
@@ -96,6 +113,64 @@ class VRX {
     void do_signal(const char* name, VX_SIGNAL_TYPE kind, VX_PROP_ARRAY* props);
     void do_mapsignal(const char* block, const char* pin, VX_PROP_ARRAY* props);
     void add_mapconn(const char* block, const char* pin, VX_PROP_ARRAY* props);
+
+    // Database to text: the top of the file and the library.
+    void write_file_header();
+    void write_library();
+    VX_STATUS finish_write(const char* path, const char* temp_name);
+
+    // Output layer: every byte of a written netlist passes through here.
+    void write_string(const char* first, const char* second);
+    void write_indent(int32_t count, const char* word1, const char* word2,
+                      const char* word3 = nullptr, const char* word4 = nullptr);
+    void write_item(std::string_view item);
+    void write_pair(std::string_view first, std::string_view second);
+    void write_line_end();
+    void begin_construct();
+    void end_construct();
+    VX_TOKEN quote_kwd(const char* name);
+    VX_TOKEN vrx_legal(const char* name, const void* object);
+    const char* build_hiername(HX_BLOCK* block);
+
+    // Properties.
+    void do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* block);
+    void write_props(const HX_OBJECT* object, uint8_t* opened);
+    void write_prop_list(const HX_OBJECT* object, uint8_t* opened, const HX_BLOCK* block);
+    uint8_t has_props(const HX_OBJECT* object);
+
+    // Object headers and type names.
+    const char* pin_type(const HX_PIN* pin);
+    const char* prim_name(const HX_PRIMITIVE* prim, uint16_t index);
+    void write_object_header(const char* keyword, const HX_OBJECT* object, const char* object_name,
+                             const char* given_name, uint16_t number, uint8_t no_name,
+                             uint8_t no_props);
+    void write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count);
+    void write_prim_header(HX_PRIMITIVE* prim, uint8_t physical, uint8_t no_props);
+    void write_user_flag(const HX_BLOCK* block);
+
+    // Pins.
+    void write_root_pins(HX_BLOCK* block);
+    void write_blk_pins(HX_BLOCK* block, uint8_t with_types);
+    void write_prim_pins(HX_PRIMITIVE* prim);
+    void write_pin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t root,
+                         uint8_t with_types);
+    void write_primpin_props(const HX_PIN_PRIMITIVE* pin, const HX_BLOCK* block, uint8_t root);
+    void write_blkpin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t* opened);
+    void write_entry(const char* lead, const char* name, std::string_view value, bool pair);
+
+    // Signals and map signals.
+    void write_signal_props(HX_BLOCK* block);
+    void write_map_signals(HX_BASEPHYSBLOCK* block);
+    void write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_TOKEN& label);
+    void write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_TOKEN& label);
+
+    // Design traversal.
+    void write_design();
+    void write_contents(HX_BLOCK* block, uint8_t physical);
+    void traverse(HX_BLOCK* block, uint8_t physical);
+    void write_child(HX_BLOCK* block, uint8_t physical);
+    void write_root_design();
+    void write_root_header(HX_BLOCK* root, uint8_t physical);
 
     // Writer state.
     int16_t indent;

@@ -1,0 +1,50 @@
+// The text that stands for a name in a written netlist.
+//
+// The writer names millions of pins and signals; most names go out exactly as
+// the database holds them. A token therefore refers to the database's text
+// when it can and keeps a text of its own only when it had to change it
+// (quotes, an invented OBJ_$ name). The caller owns the token; the text it
+// refers to must outlive it, which holds for every database name while the
+// writer runs.
+#pragma once
+
+#include <cstring>
+#include <string>
+#include <string_view>
+
+class VX_TOKEN {
+  public:
+    VX_TOKEN() = default;
+    /// A token that is the given text unchanged (not copied).
+    static VX_TOKEN refer(const char* text) {
+        VX_TOKEN t;
+        t.ref_ = text;
+        return t;
+    }
+    /// A token with a text of its own.
+    static VX_TOKEN own(std::string text) {
+        VX_TOKEN t;
+        t.text_ = std::move(text);
+        t.owned_ = true;
+        return t;
+    }
+
+    /// Makes the token independent of the text it refers to, for texts that
+    /// are overwritten before the token's last use (hierarchical names).
+    VX_TOKEN& keep() {
+        if (!owned_) {
+            text_ = ref_;
+            owned_ = true;
+        }
+        return *this;
+    }
+
+    const char* c_str() const { return owned_ ? text_.c_str() : ref_; }
+    std::string_view view() const { return owned_ ? std::string_view(text_) : std::string_view(ref_); }
+    std::size_t size() const { return owned_ ? text_.size() : std::strlen(ref_); }
+
+  private:
+    const char* ref_ = "";
+    std::string text_;
+    bool owned_ = false;
+};

@@ -1,0 +1,435 @@
+// The text writer: headers, pins, signals, map signals and the walk of a
+// design's hierarchy.
+//
+// A design becomes a flat sequence of DESIGN sections. Every block that has
+// children gets a section of its own, written before the section that
+// instantiates it (deepest first); the design's own section comes last. A
+// section holds its block's header and pins, one statement group per child,
+// then the statements of signals that carry what pins cannot (global
+// signals, signal and network properties), and in the design's own section
+// the map signals.
+#include <cstring>
+
+#include "hx_design.h"
+#include "hx_library.h"
+#include "hx_property.h"
+#include "vrx.h"
+#include "vx_typenames.h"
+#include "vx_write_internal.h"
+
+namespace {
+
+constexpr uint16_t kNoNumber = 0xFFFF;
+constexpr uint8_t kPadRole = 7;  // the PAD role of a primitive pin
+
+// Texts of header and pin entries, reused like the property text.
+std::string entry_text;
+
+std::string_view number_text(std::string_view lead, long long value) {
+    entry_text.clear();
+    entry_text.append(lead);
+    vx_append_int(entry_text, value);
+    return entry_text;
+}
+
+template <class Fn>
+void for_each_child(const HX_BLOCK* block, Fn&& fn) {
+    if (block->child_count() == 0) return;
+    UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
+    while (HX_BLOCK* child = iter->l_next()) fn(child);
+    block->delete_child_iter(iter);
+}
+
+}  // namespace
+
+// --- type names and headers -------------------------------------------------------
+
+const char* VRX::pin_type(const HX_PIN* pin) {
+    const char* keyword = vx_pin_type_name(pin->get_dir());
+    if (keyword != nullptr) return keyword;
+    vx_write_fatal(__LINE__, "cannot find pin type name for pin '%s'\n", vx_text(pin->get_name()));
+    return "";
+}
+
+const char* VRX::prim_name(const HX_PRIMITIVE* prim, uint16_t index) {
+    const HX_BLOCK* block = prim->get_block();
+    if (index == kNoNumber) {
+        const char* keyword = vx_prim_type_name(prim->get_type());
+        if (keyword != nullptr) return keyword;
+        vx_write_fatal(__LINE__, "cannot find prim type name for block '%s'\n",
+                       vx_text(block->get_name()));
+        return "";
+    }
+    const HX_PIN_PRIMITIVE* pin = prim->get_prim_pin(index);
+    const char* keyword = pin != nullptr ? vx_prim_pin_name(pin->get_role()) : nullptr;
+    if (keyword != nullptr) return keyword;
+    vx_write_fatal(__LINE__, "cannot find prim pin name for block '%s' pin %d\n",
+                   vx_text(block->get_name()), index);
+    return "";
+}
+
+// The database keeps no name common to all objects, so the caller passes the
+// object's name beside the object.
+void VRX::write_object_header(const char* keyword, const HX_OBJECT* object,
+                              const char* object_name, const char* given_name, uint16_t number,
+                              uint8_t no_name, uint8_t no_props) {
+    const VX_TOKEN label = vrx_legal(object_name, object);
+    write_indent(2, keyword, given_name != nullptr ? given_name : label.c_str());
+    if (number != kNoNumber) write_item(number_text(" ", number));
+    uint8_t opened = 0;
+    if (!no_name) {
+        entry_text.assign(" (NAME=");
+        entry_text += label.view();
+        write_item(entry_text);
+        opened = 1;
+    }
+    if (!no_props) write_prop_list(object, &opened, nullptr);
+    if (opened) write_item(")");
+}
+
+void VRX::write_user_flag(const HX_BLOCK* block) {
+    if (!omit_user && !block->is_physical() && block->get_user()) write_item(" USER");
+}
+
+void VRX::write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count) {
+    const char* plain = block->get_name();
+    const char* hier = build_hiername(block);
+    const HX_BLOCK* parent = block->get_parent();
+    VX_TOKEN label;
+    if (vx_present(plain) && vx_present(hier)) {
+        if (root) {
+            label = vrx_legal(plain, block);
+        } else if (parent != nullptr && parent->get_parent() == nullptr) {
+            // A child named like the root would be taken for the root itself.
+            if (UT_STR::Compare(plain, parent->get_name()) == 0) {
+                std::string text;
+                vx_append_invented(text, block);
+                (text += '_') += plain;
+                label = vrx_legal(text.c_str(), block).keep();
+            } else {
+                label = vrx_legal(hier, block).keep();
+            }
+        } else {
+            label = block->isempty() ? vrx_legal(plain, block) : vrx_legal(hier, block).keep();
+        }
+    } else {
+        label = vrx_legal(nullptr, block);
+    }
+    write_indent(2, block->is_physical() ? "PHYSBLOCK" : "BLOCK", label.c_str());
+    if (root || pin_count) write_item(number_text(" ", block->get_pin_count()));
+    entry_text.assign(" (NAME=");
+    entry_text += vrx_legal(plain, block).view();
+    write_item(entry_text);
+    write_user_flag(block);
+    uint8_t opened = 1;
+    if (!root) write_prop_list(block, &opened, nullptr);
+    write_item(")");
+}
+
+void VRX::write_prim_header(HX_PRIMITIVE* prim, uint8_t physical, uint8_t no_props) {
+    HX_BLOCK* block = prim->get_block();
+    write_indent(2, physical ? "PHYSPRIM" : "PRIM", prim_name(prim, kNoNumber));
+    if (prim->get_width() != kNoNumber) write_item(number_text(" ", prim->get_width()));
+    entry_text.assign(" (NAME=");
+    entry_text += vrx_legal(block->get_name(), block).view();
+    write_item(entry_text);
+    write_user_flag(block);
+    uint8_t opened = 1;
+    if (!no_props) write_prop_list(block, &opened, nullptr);
+    write_item(")");
+}
+
+// --- pins --------------------------------------------------------------------------
+
+// One "NAME=value" entry: as a pair after `lead`, or as one item that starts
+// with `lead`.
+void VRX::write_entry(const char* lead, const char* name, std::string_view value, bool pair) {
+    entry_text.assign(pair ? "" : lead);
+    entry_text += name;
+    entry_text += '=';
+    entry_text += value;
+    if (pair)
+        write_pair(lead, entry_text);
+    else
+        write_item(entry_text);
+}
+
+void VRX::write_root_pins(HX_BLOCK* block) {
+    begin_construct();
+    if (!block->is_primitive()) {
+        for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
+            const HX_PIN* pin = block->get_pin(i);
+            write_indent(2, "PIN", vrx_legal(pin->get_name(), pin).c_str());
+            write_pin_props(pin, block, 1, 0);
+        }
+    } else {
+        HX_PRIMITIVE* prim = block->get_primitive();
+        for (uint16_t i = 0; i < prim->get_pin_count(); ++i) {
+            write_indent(2, "PIN", prim_name(prim, i));
+            write_primpin_props(prim->get_prim_pin(i), block, 1);
+        }
+    }
+    end_construct();
+}
+
+void VRX::write_blk_pins(HX_BLOCK* block, uint8_t with_types) {
+    begin_construct();
+    for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
+        const HX_PIN* pin = block->get_pin(i);
+        write_indent(2, "PIN", vrx_legal(pin->get_name(), pin).c_str());
+        write_pin_props(pin, block, 0, with_types);
+    }
+    end_construct();
+}
+
+void VRX::write_prim_pins(HX_PRIMITIVE* prim) {
+    begin_construct();
+    const HX_BLOCK* block = prim->get_block();
+    for (uint16_t i = 0; i < prim->get_pin_count(); ++i) {
+        write_indent(2, "PIN", prim_name(prim, i));
+        write_primpin_props(prim->get_prim_pin(i), block, 0);
+    }
+    end_construct();
+}
+
+void VRX::write_pin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t root,
+                          uint8_t with_types) {
+    if (root) {
+        write_pair(" ", "(");
+        write_entry("", "TYPE", pin_type(pin), false);
+        if (const HX_SIGNAL* inner = pin->get_inner_signal())
+            write_entry(" ", "CONN", vrx_legal(inner->get_name(), inner).view(), false);
+        write_pair(")", "\r\n");
+        return;
+    }
+    uint8_t opened = 0;
+    if (with_types) {
+        write_pair(" ", "(");
+        opened = 1;
+        write_entry("", "TYPE", pin_type(pin), false);
+    }
+    if (const HX_SIGNAL* outer = pin->get_outer_signal()) {
+        if (opened) {
+            write_item(" ");
+        } else {
+            write_pair(" ", "(");
+            opened = 1;
+        }
+        write_entry("", "CONN", vrx_legal(outer->get_name(), outer).view(), false);
+    }
+    write_blkpin_props(pin, block, &opened);
+    if (opened)
+        write_pair(")", "\r\n");
+    else
+        write_string("\r\n", nullptr);
+}
+
+void VRX::write_primpin_props(const HX_PIN_PRIMITIVE* pin, const HX_BLOCK* block, uint8_t root) {
+    write_pair(" ", "(");
+    write_entry("", "NAME", vrx_legal(pin->get_name(), pin).view(), false);
+    if (pin->get_inverted()) write_pair(" ", "INV");
+    const HX_SIGNAL* signal = root ? pin->get_inner_signal() : pin->get_outer_signal();
+    if (root || pin->get_role() == kPadRole) write_entry(" ", "TYPE", pin_type(pin), true);
+    if (signal != nullptr)
+        write_entry(" ", "CONN", vrx_legal(signal->get_name(), signal).view(), true);
+    if (!root) {
+        uint8_t opened = 1;
+        write_prop_list(pin, &opened, block);
+    }
+    write_pair(")", "\r\n");
+}
+
+void VRX::write_blkpin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t* opened) {
+    write_prop_list(pin, opened, block);
+}
+
+// --- signals and map signals ---------------------------------------------------------
+
+void VRX::write_signal_props(HX_BLOCK* block) {
+    const char* keyword = block->is_physical() ? "PHYSSIGNAL" : "SIGNAL";
+    UT_BLIST_ITER<HX_SIGNAL>* globals = block->create_global_siglist(1);
+    while (HX_SIGNAL* g = globals->l_next()) {
+        write_indent(4, keyword, vrx_legal(g->get_name(), g).c_str(), "(", "GLOBAL");
+        uint8_t opened = 1;
+        write_prop_list(g, &opened, nullptr);
+        if (const HX_NETWORK* net = g->get_network()) write_prop_list(net, &opened, nullptr);
+        write_pair(")", "\r\n");
+    }
+    block->delete_global_siglist(globals);
+
+    UT_BLISTS_ITER<HX_SIGNAL>* signals = block->create_signal_iter();
+    while (HX_SIGNAL* s = signals->l_next()) {
+        const HX_NETWORK* net = s->get_network();
+        const bool own = has_props(s);
+        const bool of_net = net != nullptr && net->get_highest_signal() == s && has_props(net);
+        if (!own && !of_net) continue;
+        write_indent(2, keyword, vrx_legal(s->get_name(), s).c_str());
+        uint8_t opened = 0;
+        if (own) write_prop_list(s, &opened, nullptr);
+        if (of_net) write_prop_list(net, &opened, nullptr);
+        // Every property may still have been left out (a time stamp, say):
+        // the statement then ends without a list.
+        if (opened)
+            write_pair(")", "\r\n");
+        else
+            write_string("\r\n", nullptr);
+    }
+    block->delete_signal_iter(signals);
+}
+
+void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
+    for_each_child(block, [&](HX_BLOCK* child) {
+        write_map_signals(static_cast<HX_BASEPHYSBLOCK*>(child));
+    });
+    VX_TOKEN label;
+    bool labelled = false;
+    auto label_of_block = [&]() -> const VX_TOKEN& {
+        if (!labelled) {
+            label = vrx_legal(build_hiername(block), block).keep();
+            labelled = true;
+        }
+        return label;
+    };
+    for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
+        const HX_PIN* pin = block->get_pin(i);
+        if (pin->get_map_signal() != nullptr) write_pin_mapsignal(block, pin, label_of_block());
+    }
+    write_unmapped_children(block, label_of_block());
+}
+
+void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_TOKEN& label) {
+    const HX_MAPSIGNAL* map = pin->get_map_signal();
+    write_indent(2, "MAPSIGNAL", label.c_str());
+    write_pair(" ", vrx_legal(pin->get_name(), pin).view());
+    uint8_t opened = 0;
+    write_prop_list(map, &opened, nullptr);
+    if (opened) write_item(")");
+    begin_construct();
+    HX_SIGNAL::CONN_ITER* conns = map->create_conn_iter();
+    while (HX_CONN* conn = conns->l_next()) {
+        HX_BLOCK* target = conn->get_block();
+        if (target == block) continue;
+        const HX_PIN* target_pin = conn->get_pin();
+        const VX_TOKEN target_label = vrx_legal(build_hiername(target), target).keep();
+        write_indent(3, "MAPCONN", target_label.c_str(),
+                     vrx_legal(target_pin->get_name(), target_pin).c_str());
+        if (target_pin->get_mapinv()) write_item(" (MAPINV)");
+        write_string("\r\n", nullptr);
+    }
+    map->delete_conn_iter(conns);
+    end_construct();
+}
+
+// Logical blocks placed in this physical block without a map signal: one
+// MAPSIGNAL statement without pin names them all.
+void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_TOKEN& label) {
+    UT_BLIST_ITER<HX_BLOCK>* children = block->create_log_child_iter();
+    bool opened = false;
+    while (HX_BLOCK* child = children->l_next()) {
+        bool mapped = false;
+        for (uint16_t i = 0; i < child->get_pin_count() && !mapped; ++i)
+            mapped = child->get_pin(i)->get_map_signal() != nullptr;
+        if (mapped) continue;
+        if (!opened) {
+            write_indent(2, "MAPSIGNAL", label.c_str());
+            begin_construct();
+            opened = true;
+        }
+        const VX_TOKEN child_label = vrx_legal(build_hiername(child), child).keep();
+        write_indent(3, "MAPCONN", child_label.c_str(), "\r\n");
+    }
+    block->delete_log_child_iter(children);
+    if (opened) end_construct();
+}
+
+// --- design traversal -------------------------------------------------------------------
+
+void VRX::write_design() {
+    log_root = design->get_log_root();
+    phys_root = design->get_phys_root();
+    write_contents(log_root, 0);
+    write_contents(phys_root, 1);
+    write_root_design();
+}
+
+void VRX::write_contents(HX_BLOCK* block, uint8_t physical) {
+    if (block == nullptr) return;
+    for_each_child(block, [&](HX_BLOCK* child) { traverse(child, physical); });
+}
+
+void VRX::traverse(HX_BLOCK* block, uint8_t physical) {
+    if (block->child_count() == 0) return;
+    for_each_child(block, [&](HX_BLOCK* child) { traverse(child, physical); });
+
+    const char* plain = block->get_name();
+    const char* hier = build_hiername(block);
+    const HX_BLOCK* parent = block->get_parent();
+    VX_TOKEN design_name;
+    VX_TOKEN block_name;
+    if (vx_present(plain) && vx_present(hier)) {
+        block_name = vrx_legal(hier, block).keep();
+        if (parent != nullptr && parent->get_parent() == nullptr &&
+            UT_STR::Compare(plain, parent->get_name()) == 0) {
+            std::string text;
+            vx_append_invented(text, block);
+            (text += '_') += plain;
+            design_name = vrx_legal(text.c_str(), block).keep();
+        } else {
+            design_name = block_name;
+        }
+    } else {
+        design_name = vrx_legal(nullptr, block);
+        block_name = design_name;
+    }
+    write_object_header("DESIGN", block, plain, design_name.c_str(), kNoNumber, 1, 1);
+    begin_construct();
+    if (HX_PRIMITIVE* prim = block->get_primitive())
+        write_prim_header(prim, physical, 1);
+    else
+        write_object_header(physical ? "PHYSBLOCK" : "BLOCK", block, plain, block_name.c_str(),
+                            block->get_pin_count(), 1, 1);
+    write_root_pins(block);
+    for_each_child(block, [&](HX_BLOCK* child) { write_child(child, physical); });
+    write_signal_props(block);
+    end_construct();
+}
+
+void VRX::write_child(HX_BLOCK* block, uint8_t physical) {
+    HX_PRIMITIVE* prim = block->get_primitive();
+    if (prim != nullptr && block->child_count() == 0) {
+        write_prim_header(prim, physical, 0);
+        write_prim_pins(prim);
+    } else if (block->child_count() != 0) {
+        write_blk_header(block, 0, 0);
+        write_blk_pins(block, 0);
+    } else {
+        write_blk_header(block, 0, 1);
+        write_blk_pins(block, 1);
+    }
+}
+
+void VRX::write_root_header(HX_BLOCK* root, uint8_t physical) {
+    if (root->is_primitive())
+        write_prim_header(root->get_primitive(), physical, 1);
+    else
+        write_blk_header(root, 1, 0);
+    write_root_pins(root);
+}
+
+void VRX::write_root_design() {
+    const VX_TOKEN name = vrx_legal(design->get_name(), design);
+    write_object_header("DESIGN", design, design->get_name(), name.c_str(), kNoNumber, 1, 0);
+    begin_construct();
+    if (log_root != nullptr) write_root_header(log_root, 0);
+    if (phys_root != nullptr) write_root_header(phys_root, 1);
+    if (log_root != nullptr)
+        for_each_child(log_root, [&](HX_BLOCK* child) { write_child(child, 0); });
+    if (phys_root != nullptr)
+        for_each_child(phys_root, [&](HX_BLOCK* child) { write_child(child, 1); });
+    if (log_root != nullptr) write_signal_props(log_root);
+    if (phys_root != nullptr) {
+        write_signal_props(phys_root);
+        write_map_signals(phys_root);
+    }
+    end_construct();
+}

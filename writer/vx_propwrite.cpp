@@ -1,0 +1,166 @@
+// Properties in a written netlist: "NAME", "NAME=value" or "NAME=@param"
+// inside the parenthesised list after an object's header or pin. The list is
+// opened by the first property written (" (") and closed by the caller.
+//
+// The property filter, when given, renames or drops each property first.
+// Net tags of merge records are written as the name of the net they stand
+// for, so that the text holds nothing that only the database knows.
+#include <cstdio>
+#include <cstring>
+
+#include "hx_design.h"
+#include "hx_property.h"
+#include "hxb_propfilter.h"
+#include "hxb_util.h"
+#include "vrx.h"
+#include "vx_write_internal.h"
+
+namespace {
+
+// The text of one property, reused so that writing allocates nothing once
+// the longest property has been seen.
+std::string prop_text;
+
+bool names_net_tag(const char* name) {
+    return std::strcmp(name, "MERGEDTO") == 0 || std::strcmp(name, "MERGEDFROM") == 0 ||
+           std::strcmp(name, "JOINED") == 0;
+}
+
+// Starts the text of a property: the lead-in that opens the list or follows
+// the one before, then the name.
+void begin_text(uint8_t opened, const char* name) {
+    prop_text.assign(opened ? " " : " (");
+    prop_text += name;
+}
+
+void append_float(double value) {
+    char digits[400];  // "%f" of the largest double fits
+    const int n = std::snprintf(digits, sizeof digits, "%f", value);
+    if (n > 0) prop_text.append(digits, static_cast<std::size_t>(n));
+}
+
+}  // namespace
+
+void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* block) {
+    if (prop_filter != nullptr) {
+        const HX_PROPERTY* mapped = nullptr;
+        prop_filter->map_prop(prop, mapped);
+        if (mapped == nullptr) return;
+        prop = mapped;
+    }
+    const char* name = prop->get_name();
+    switch (prop->get_kind()) {
+        case HX_PROP_FLAG:
+            if (*opened) {
+                write_pair(" ", name);
+                return;
+            }
+            begin_text(*opened, name);
+            break;
+        case HX_PROP_INT: {
+            if (std::strcmp(name, "CREATE_TIMESTAMP") == 0) return;
+            const int32_t value = prop->get_int();
+            begin_text(*opened, name);
+            prop_text += '=';
+            if (names_net_tag(name)) {
+                const HX_NETWORK* net =
+                    design ? hx_find_net_tag(design, static_cast<uint32_t>(value)) : nullptr;
+                if (net == nullptr) {
+                    vx_write_msg(__LINE__).issueInternal("No net found for tag in %s=%d property.\n",
+                                                         name, value);
+                    return;
+                }
+                prop_text += vrx_legal(net->get_name(), net).view();
+            } else {
+                vx_append_int(prop_text, value);
+            }
+            break;
+        }
+        case HX_PROP_FLOAT:
+            begin_text(*opened, name);
+            prop_text += '=';
+            append_float(prop->get_float());
+            break;
+        case HX_PROP_STRING:
+            begin_text(*opened, name);
+            prop_text += '=';
+            prop_text += vrx_legal(vx_text(prop->get_text()), nullptr).view();
+            break;
+        case HX_PROP_OBJECT:
+            vx_write_msg(__LINE__).issueWarning("Unable to write out OBJECT prop.\n");
+            return;
+        case HX_PROP_TIMING: {
+            HX_PROP_TIMING_DATA record{INT32_MIN, INT32_MIN, 3};
+            prop->get_timing(record);
+            begin_text(*opened, name);
+            prop_text += '=';
+            prop_text += Hxb_Util::form_timing(record);
+            break;
+        }
+        case HX_PROP_PINREF: {
+            if (block == nullptr) {
+                vx_write_msg(__LINE__).issueError(
+                    "Ignoring pinref property found on non-block object\n");
+                return;
+            }
+            HX_PROP_PINREF_DATA record{INT32_MIN, INT32_MIN, 3, 65535, 3, 0};
+            prop->get_pinref(record);
+            begin_text(*opened, name);
+            prop_text += '=';
+            prop_text += Hxb_Util::form_pinref(record, block);
+            break;
+        }
+        case HX_PROP_PARAM: {
+            const char* value = prop->get_text();
+            if (value == nullptr) {
+                vx_write_fatal(__LINE__, "parameter %s with NULL value", name);
+                return;
+            }
+            begin_text(*opened, name);
+            prop_text += "=@";
+            prop_text += value;
+            break;
+        }
+        case HX_PROP_TIMINGSTR:
+            begin_text(*opened, name);
+            prop_text += '=';
+            prop_text += Hxb_Util::form_timingstr(prop);
+            break;
+        default:
+            vx_write_fatal(__LINE__, "invalid property type.\n");
+            return;
+    }
+    write_item(prop_text);
+    *opened = 1;
+}
+
+void VRX::write_prop_list(const HX_OBJECT* object, uint8_t* opened, const HX_BLOCK* block) {
+    UT_BLISTS_ITER<HX_PROPERTY>* iter = object->create_prop_iter();
+    if (iter == nullptr) return;
+    while (const HX_PROPERTY* prop = iter->l_next()) do_prop(prop, opened, block);
+    object->delete_prop_iter(iter);
+}
+
+void VRX::write_props(const HX_OBJECT* object, uint8_t* opened) {
+    write_prop_list(object, opened, nullptr);
+}
+
+uint8_t VRX::has_props(const HX_OBJECT* object) {
+    UT_BLISTS_ITER<HX_PROPERTY>* iter = object->create_prop_iter();
+    if (iter == nullptr) return 0;
+    uint8_t found = 0;
+    while (const HX_PROPERTY* prop = iter->l_next()) {
+        if (prop->get_kind() == HX_PROP_OBJECT) continue;
+        const HX_PROPERTY* mapped = prop;
+        if (prop_filter != nullptr) {
+            mapped = nullptr;
+            prop_filter->map_prop(prop, mapped);
+        }
+        if (mapped != nullptr) {
+            found = 1;
+            break;
+        }
+    }
+    object->delete_prop_iter(iter);
+    return found;
+}
