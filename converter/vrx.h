@@ -19,7 +19,7 @@
 #include "ut_btr_tree.h"
 #include "ut_ptrfile.h"
 #include "vrx_parser.h"
-#include "vx_token.h"
+#include "vx_legalname.h"
 
 class Hxb_PropFilter;
 class HX_PROPERTY;
@@ -128,8 +128,8 @@ class VRX {
     void write_line_end();
     void begin_construct();
     void end_construct();
-    VX_TOKEN quote_kwd(const char* name);
-    VX_TOKEN vrx_legal(const char* name, const void* object);
+    VX_LEGALNAME quote_kwd(const char* name);
+    VX_LEGALNAME vrx_legal(const char* name, const void* object);
     const char* build_hiername(HX_BLOCK* block);
 
     // Properties.
@@ -161,8 +161,8 @@ class VRX {
     // Signals and map signals.
     void write_signal_props(HX_BLOCK* block);
     void write_map_signals(HX_BASEPHYSBLOCK* block);
-    void write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_TOKEN& label);
-    void write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_TOKEN& label);
+    void write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_LEGALNAME& label);
+    void write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_LEGALNAME& label);
 
     // Design traversal.
     void write_design();

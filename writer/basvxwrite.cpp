@@ -73,7 +73,7 @@ const char* VRX::prim_name(const HX_PRIMITIVE* prim, uint16_t index) {
 void VRX::write_object_header(const char* keyword, const HX_OBJECT* object,
                               const char* object_name, const char* given_name, uint16_t number,
                               uint8_t no_name, uint8_t no_props) {
-    const VX_TOKEN label = vrx_legal(object_name, object);
+    const VX_LEGALNAME label = vrx_legal(object_name, object);
     write_indent(2, keyword, given_name != nullptr ? given_name : label.c_str());
     if (number != kNoNumber) write_item(number_text(" ", number));
     uint8_t opened = 0;
@@ -95,7 +95,7 @@ void VRX::write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count) {
     const char* plain = block->get_name();
     const char* hier = build_hiername(block);
     const HX_BLOCK* parent = block->get_parent();
-    VX_TOKEN label;
+    VX_LEGALNAME label;
     if (vx_present(plain) && vx_present(hier)) {
         if (root) {
             label = vrx_legal(plain, block);
@@ -281,9 +281,9 @@ void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
     for_each_child(block, [&](HX_BLOCK* child) {
         write_map_signals(static_cast<HX_BASEPHYSBLOCK*>(child));
     });
-    VX_TOKEN label;
+    VX_LEGALNAME label;
     bool labelled = false;
-    auto label_of_block = [&]() -> const VX_TOKEN& {
+    auto label_of_block = [&]() -> const VX_LEGALNAME& {
         if (!labelled) {
             label = vrx_legal(build_hiername(block), block).keep();
             labelled = true;
@@ -297,7 +297,7 @@ void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
     write_unmapped_children(block, label_of_block());
 }
 
-void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_TOKEN& label) {
+void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_LEGALNAME& label) {
     const HX_MAPSIGNAL* map = pin->get_map_signal();
     write_indent(2, "MAPSIGNAL", label.c_str());
     write_pair(" ", vrx_legal(pin->get_name(), pin).view());
@@ -310,7 +310,7 @@ void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const 
         HX_BLOCK* target = conn->get_block();
         if (target == block) continue;
         const HX_PIN* target_pin = conn->get_pin();
-        const VX_TOKEN target_label = vrx_legal(build_hiername(target), target).keep();
+        const VX_LEGALNAME target_label = vrx_legal(build_hiername(target), target).keep();
         write_indent(3, "MAPCONN", target_label.c_str(),
                      vrx_legal(target_pin->get_name(), target_pin).c_str());
         if (target_pin->get_mapinv()) write_item(" (MAPINV)");
@@ -322,7 +322,7 @@ void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const 
 
 // Logical blocks placed in this physical block without a map signal: one
 // MAPSIGNAL statement without pin names them all.
-void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_TOKEN& label) {
+void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_LEGALNAME& label) {
     UT_BLIST_ITER<HX_BLOCK>* children = block->create_log_child_iter();
     bool opened = false;
     while (HX_BLOCK* child = children->l_next()) {
@@ -335,7 +335,7 @@ void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_TOKEN& label
             begin_construct();
             opened = true;
         }
-        const VX_TOKEN child_label = vrx_legal(build_hiername(child), child).keep();
+        const VX_LEGALNAME child_label = vrx_legal(build_hiername(child), child).keep();
         write_indent(3, "MAPCONN", child_label.c_str(), "\r\n");
     }
     block->delete_log_child_iter(children);
@@ -364,8 +364,8 @@ void VRX::traverse(HX_BLOCK* block, uint8_t physical) {
     const char* plain = block->get_name();
     const char* hier = build_hiername(block);
     const HX_BLOCK* parent = block->get_parent();
-    VX_TOKEN design_name;
-    VX_TOKEN block_name;
+    VX_LEGALNAME design_name;
+    VX_LEGALNAME block_name;
     if (vx_present(plain) && vx_present(hier)) {
         block_name = vrx_legal(hier, block).keep();
         if (parent != nullptr && parent->get_parent() == nullptr &&
@@ -417,7 +417,7 @@ void VRX::write_root_header(HX_BLOCK* root, uint8_t physical) {
 }
 
 void VRX::write_root_design() {
-    const VX_TOKEN name = vrx_legal(design->get_name(), design);
+    const VX_LEGALNAME name = vrx_legal(design->get_name(), design);
     write_object_header("DESIGN", design, design->get_name(), name.c_str(), kNoNumber, 1, 0);
     begin_construct();
     if (log_root != nullptr) write_root_header(log_root, 0);

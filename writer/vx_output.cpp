@@ -206,17 +206,17 @@ void VRX::end_construct() {
 
 // --- names -----------------------------------------------------------------------
 
-VX_TOKEN VRX::quote_kwd(const char* name) {
-    if (name != nullptr && is_keyword(name)) return VX_TOKEN::own(quoted(name));
-    return VX_TOKEN::refer(vx_text(name));
+VX_LEGALNAME VRX::quote_kwd(const char* name) {
+    if (name != nullptr && is_keyword(name)) return VX_LEGALNAME::own(quoted(name));
+    return VX_LEGALNAME::refer(vx_text(name));
 }
 
-VX_TOKEN VRX::vrx_legal(const char* name, const void* object) {
-    if (vx_present(name)) return needs_quotes(name) ? VX_TOKEN::own(quoted(name)) : quote_kwd(name);
-    if (object == nullptr) return VX_TOKEN::refer("\"\"");
+VX_LEGALNAME VRX::vrx_legal(const char* name, const void* object) {
+    if (vx_present(name)) return needs_quotes(name) ? VX_LEGALNAME::own(quoted(name)) : quote_kwd(name);
+    if (object == nullptr) return VX_LEGALNAME::refer("\"\"");
     std::string invented;
     vx_append_invented(invented, object);
-    return VX_TOKEN::own(std::move(invented));
+    return VX_LEGALNAME::own(std::move(invented));
 }
 
 const char* VRX::build_hiername(HX_BLOCK* block) {

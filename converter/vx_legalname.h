@@ -1,4 +1,4 @@
-// The text that stands for a name in a written netlist.
+// The text that stands for a name in a written netlist (what vrx_legal gives).
 //
 // The writer names millions of pins and signals; most names go out exactly as
 // the database holds them. A token therefore refers to the database's text
@@ -12,18 +12,18 @@
 #include <string>
 #include <string_view>
 
-class VX_TOKEN {
+class VX_LEGALNAME {
   public:
-    VX_TOKEN() = default;
+    VX_LEGALNAME() = default;
     /// A token that is the given text unchanged (not copied).
-    static VX_TOKEN refer(const char* text) {
-        VX_TOKEN t;
+    static VX_LEGALNAME refer(const char* text) {
+        VX_LEGALNAME t;
         t.ref_ = text;
         return t;
     }
     /// A token with a text of its own.
-    static VX_TOKEN own(std::string text) {
-        VX_TOKEN t;
+    static VX_LEGALNAME own(std::string text) {
+        VX_LEGALNAME t;
         t.text_ = std::move(text);
         t.owned_ = true;
         return t;
@@ -31,7 +31,7 @@ class VX_TOKEN {
 
     /// Makes the token independent of the text it refers to, for texts that
     /// are overwritten before the token's last use (hierarchical names).
-    VX_TOKEN& keep() {
+    VX_LEGALNAME& keep() {
         if (!owned_) {
             text_ = ref_;
             owned_ = true;
