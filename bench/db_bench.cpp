@@ -19,10 +19,10 @@
 #include <chrono>
 #include <cstdio>
 #include <memory>
-#include <random>
 #include <string>
 #include <vector>
 
+#include "and_design.h"
 #include "hx_library.h"
 #include "port_file.h"
 #include "port_msg.h"
@@ -30,29 +30,6 @@
 #include "vrx.h"
 
 namespace {
-
-constexpr uint32_t kGates = 1'000'000;
-constexpr uint32_t kPinsPerGate = 3;
-
-/// Builds the gates into a fresh library; signal n<i> is gate i's output and
-/// each input names a random n<j>, made on first mention as a reader would.
-HX_DESIGN* build_and_design(HX_LIBRARY& library, uint32_t gates) {
-    HX_DESIGN* design = library.create_design("ands");
-    HX_LOGBLOCK* root = design->create_logblock(nullptr, 0, "ands");
-    VX_SIGNALCACHE signals;
-    signals.design = design;
-    std::mt19937 random(12345);
-    std::uniform_int_distribution<uint32_t> pick(0, gates - 1);
-    char name[16];
-    for (uint32_t i = 0; i < gates; ++i) {
-        HX_LOGPRIM* gate = design->create_logprim(root, HX_PRIM_AND, 2, nullptr);
-        for (uint16_t pin = 0; pin < kPinsPerGate; ++pin) {
-            std::snprintf(name, sizeof name, "n%u", pin == 2 ? i : pick(random));
-            design->create_conn(signals.find_or_create(name, 0), gate, pin);
-        }
-    }
-    return design;
-}
 
 /// Peak resident memory (bytes) of a child process that runs `work`.
 template <class Work>

@@ -10,7 +10,9 @@
 // and stay valid for the host after the converter is gone.
 #pragma once
 
+#include <climits>
 #include <cstdint>
+#include <string_view>
 
 #include "hx_design.h"
 #include "hx_library.h"
@@ -120,12 +122,22 @@ class VRX {
     VX_STATUS finish_write(const char* path, const char* temp_name);
 
     // Output layer: every byte of a written netlist passes through here.
+    // An absent word of write_indent is a view without data.
     void write_string(const char* first, const char* second);
-    void write_indent(int32_t count, const char* word1, const char* word2,
-                      const char* word3 = nullptr, const char* word4 = nullptr);
+    void write_indent(int32_t count, std::string_view word1, std::string_view word2,
+                      std::string_view word3 = {}, std::string_view word4 = {});
     void write_item(std::string_view item);
     void write_pair(std::string_view first, std::string_view second);
     void write_line_end();
+    void write_joined(std::string_view bytes, bool pair);
+    void end_line(std::string_view text);
+    void break_before(std::size_t length, bool pair);
+    void put_indent(int levels);
+    void put(std::string_view bytes) {
+        out_stream->write(bytes.data(), bytes.size());
+        const int64_t next = static_cast<int64_t>(column) + static_cast<int64_t>(bytes.size());
+        column = next > INT32_MAX ? INT32_MAX : static_cast<int32_t>(next);
+    }
     void begin_construct();
     void end_construct();
     VX_LEGALNAME quote_kwd(const char* name);
@@ -142,7 +154,7 @@ class VRX {
     const char* pin_type(const HX_PIN* pin);
     const char* prim_name(const HX_PRIMITIVE* prim, uint16_t index);
     void write_object_header(const char* keyword, const HX_OBJECT* object, const char* object_name,
-                             const char* given_name, uint16_t number, uint8_t no_name,
+                             std::string_view given_name, uint16_t number, uint8_t no_name,
                              uint8_t no_props);
     void write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count);
     void write_prim_header(HX_PRIMITIVE* prim, uint8_t physical, uint8_t no_props);
@@ -156,7 +168,7 @@ class VRX {
                          uint8_t with_types);
     void write_primpin_props(const HX_PIN_PRIMITIVE* pin, const HX_BLOCK* block, uint8_t root);
     void write_blkpin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t* opened);
-    void write_entry(const char* lead, const char* name, std::string_view value, bool pair);
+    void write_entry(std::string_view head, std::string_view value, bool pair);
 
     // Signals and map signals.
     void write_signal_props(HX_BLOCK* block);

@@ -8,7 +8,6 @@
 // writer runs.
 #pragma once
 
-#include <cstring>
 #include <string>
 #include <string_view>
 
@@ -16,7 +15,7 @@ class VX_LEGALNAME {
   public:
     VX_LEGALNAME() = default;
     /// A token that is the given text unchanged (not copied).
-    static VX_LEGALNAME refer(const char* text) {
+    static VX_LEGALNAME refer(std::string_view text) {
         VX_LEGALNAME t;
         t.ref_ = text;
         return t;
@@ -39,12 +38,12 @@ class VX_LEGALNAME {
         return *this;
     }
 
-    const char* c_str() const { return owned_ ? text_.c_str() : ref_; }
-    std::string_view view() const { return owned_ ? std::string_view(text_) : std::string_view(ref_); }
-    std::size_t size() const { return owned_ ? text_.size() : std::strlen(ref_); }
+    /// The text, NUL-terminated.
+    const char* c_str() const { return owned_ ? text_.c_str() : ref_.data(); }
+    std::string_view view() const { return owned_ ? std::string_view(text_) : ref_; }
 
   private:
-    const char* ref_ = "";
+    std::string_view ref_ = "";  // NUL-terminated: a database name or a literal
     std::string text_;
     bool owned_ = false;
 };

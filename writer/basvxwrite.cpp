@@ -8,6 +8,8 @@
 // then the statements of signals that carry what pins cannot (global
 // signals, signal and network properties), and in the design's own section
 // the map signals.
+#include <algorithm>
+#include <charconv>
 #include <cstring>
 
 #include "hx_design.h"
@@ -22,14 +24,11 @@ namespace {
 constexpr uint16_t kNoNumber = 0xFFFF;
 constexpr uint8_t kPadRole = 7;  // the PAD role of a primitive pin
 
-// Texts of header and pin entries, reused like the property text.
-std::string entry_text;
-
-std::string_view number_text(std::string_view lead, long long value) {
-    entry_text.clear();
-    entry_text.append(lead);
-    vx_append_int(entry_text, value);
-    return entry_text;
+// " <number>", in a buffer of the caller's.
+std::string_view number_text(char (&buffer)[16], long long value) {
+    buffer[0] = ' ';
+    const auto r = std::to_chars(buffer + 1, buffer + sizeof buffer, value);
+    return std::string_view(buffer, static_cast<std::size_t>(r.ptr - buffer));
 }
 
 template <class Fn>
@@ -37,6 +36,42 @@ void for_each_child(const HX_BLOCK* block, Fn&& fn) {
     if (block->child_count() == 0) return;
     UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
     while (HX_BLOCK* child = iter->l_next()) fn(child);
+    block->delete_child_iter(iter);
+}
+
+// Child statements name the signals on the children's pins, which lie
+// anywhere in the design. Reading a few children ahead and asking for their
+// signals early overlaps those memory reads instead of waiting for each.
+void prefetch_pin_signals(const HX_BLOCK* block) {
+    const uint16_t count = std::min<uint16_t>(block->get_pin_count(), 8);
+    for (uint16_t i = 0; i < count; ++i) {
+        const HX_SIGNAL* signal = block->get_pin(i)->get_outer_signal();
+        if (signal == nullptr) continue;
+        __builtin_prefetch(signal);
+        __builtin_prefetch(reinterpret_cast<const char*>(signal) + 64);  // the name behind it
+    }
+}
+
+template <class Fn>
+void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
+    if (block->child_count() == 0) return;
+    constexpr int kAhead = 8;
+    HX_BLOCK* ring[kAhead];
+    int head = 0;
+    int queued = 0;
+    UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
+    for (;;) {
+        while (queued < kAhead) {
+            HX_BLOCK* next = iter->l_next();
+            if (next == nullptr) break;
+            prefetch_pin_signals(next);
+            ring[(head + queued++) % kAhead] = next;
+        }
+        if (queued == 0) break;
+        fn(ring[head]);
+        head = (head + 1) % kAhead;
+        --queued;
+    }
     block->delete_child_iter(iter);
 }
 
@@ -71,16 +106,15 @@ const char* VRX::prim_name(const HX_PRIMITIVE* prim, uint16_t index) {
 // The database keeps no name common to all objects, so the caller passes the
 // object's name beside the object.
 void VRX::write_object_header(const char* keyword, const HX_OBJECT* object,
-                              const char* object_name, const char* given_name, uint16_t number,
+                              const char* object_name, std::string_view given_name, uint16_t number,
                               uint8_t no_name, uint8_t no_props) {
     const VX_LEGALNAME label = vrx_legal(object_name, object);
-    write_indent(2, keyword, given_name != nullptr ? given_name : label.c_str());
-    if (number != kNoNumber) write_item(number_text(" ", number));
+    write_indent(2, keyword, given_name.data() != nullptr ? given_name : label.view());
+    char digits[16];
+    if (number != kNoNumber) write_item(number_text(digits, number));
     uint8_t opened = 0;
     if (!no_name) {
-        entry_text.assign(" (NAME=");
-        entry_text += label.view();
-        write_item(entry_text);
+        write_entry(" (NAME=", label.view(), false);
         opened = 1;
     }
     if (!no_props) write_prop_list(object, &opened, nullptr);
@@ -115,11 +149,10 @@ void VRX::write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count) {
     } else {
         label = vrx_legal(nullptr, block);
     }
-    write_indent(2, block->is_physical() ? "PHYSBLOCK" : "BLOCK", label.c_str());
-    if (root || pin_count) write_item(number_text(" ", block->get_pin_count()));
-    entry_text.assign(" (NAME=");
-    entry_text += vrx_legal(plain, block).view();
-    write_item(entry_text);
+    write_indent(2, block->is_physical() ? "PHYSBLOCK" : "BLOCK", label.view());
+    char digits[16];
+    if (root || pin_count) write_item(number_text(digits, block->get_pin_count()));
+    write_entry(" (NAME=", vrx_legal(plain, block).view(), false);
     write_user_flag(block);
     uint8_t opened = 1;
     if (!root) write_prop_list(block, &opened, nullptr);
@@ -129,10 +162,9 @@ void VRX::write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count) {
 void VRX::write_prim_header(HX_PRIMITIVE* prim, uint8_t physical, uint8_t no_props) {
     HX_BLOCK* block = prim->get_block();
     write_indent(2, physical ? "PHYSPRIM" : "PRIM", prim_name(prim, kNoNumber));
-    if (prim->get_width() != kNoNumber) write_item(number_text(" ", prim->get_width()));
-    entry_text.assign(" (NAME=");
-    entry_text += vrx_legal(block->get_name(), block).view();
-    write_item(entry_text);
+    char digits[16];
+    if (prim->get_width() != kNoNumber) write_item(number_text(digits, prim->get_width()));
+    write_entry(" (NAME=", vrx_legal(block->get_name(), block).view(), false);
     write_user_flag(block);
     uint8_t opened = 1;
     if (!no_props) write_prop_list(block, &opened, nullptr);
@@ -141,17 +173,13 @@ void VRX::write_prim_header(HX_PRIMITIVE* prim, uint8_t physical, uint8_t no_pro
 
 // --- pins --------------------------------------------------------------------------
 
-// One "NAME=value" entry: as a pair after `lead`, or as one item that starts
-// with `lead`.
-void VRX::write_entry(const char* lead, const char* name, std::string_view value, bool pair) {
-    entry_text.assign(pair ? "" : lead);
-    entry_text += name;
-    entry_text += '=';
-    entry_text += value;
-    if (pair)
-        write_pair(lead, entry_text);
-    else
-        write_item(entry_text);
+// One entry: `head` (the lead-in, the name and "=") and the value, as one
+// item or, with `pair`, as the pair of the lead-in and the rest; that only
+// decides where the line may break.
+void VRX::write_entry(std::string_view head, std::string_view value, bool pair) {
+    break_before(head.size() + value.size(), pair);
+    put(head);
+    put(value);
 }
 
 void VRX::write_root_pins(HX_BLOCK* block) {
@@ -159,7 +187,7 @@ void VRX::write_root_pins(HX_BLOCK* block) {
     if (!block->is_primitive()) {
         for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
             const HX_PIN* pin = block->get_pin(i);
-            write_indent(2, "PIN", vrx_legal(pin->get_name(), pin).c_str());
+            write_indent(2, "PIN", vrx_legal(pin->get_name(), pin).view());
             write_pin_props(pin, block, 1, 0);
         }
     } else {
@@ -176,7 +204,7 @@ void VRX::write_blk_pins(HX_BLOCK* block, uint8_t with_types) {
     begin_construct();
     for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
         const HX_PIN* pin = block->get_pin(i);
-        write_indent(2, "PIN", vrx_legal(pin->get_name(), pin).c_str());
+        write_indent(2, "PIN", vrx_legal(pin->get_name(), pin).view());
         write_pin_props(pin, block, 0, with_types);
     }
     end_construct();
@@ -195,48 +223,48 @@ void VRX::write_prim_pins(HX_PRIMITIVE* prim) {
 void VRX::write_pin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t root,
                           uint8_t with_types) {
     if (root) {
-        write_pair(" ", "(");
-        write_entry("", "TYPE", pin_type(pin), false);
+        write_joined(" (", true);
+        write_entry("TYPE=", pin_type(pin), false);
         if (const HX_SIGNAL* inner = pin->get_inner_signal())
-            write_entry(" ", "CONN", vrx_legal(inner->get_name(), inner).view(), false);
-        write_pair(")", "\r\n");
+            write_entry(" CONN=", vrx_legal(inner->get_name(), inner).view(), false);
+        end_line(")");
         return;
     }
     uint8_t opened = 0;
     if (with_types) {
-        write_pair(" ", "(");
+        write_joined(" (", true);
         opened = 1;
-        write_entry("", "TYPE", pin_type(pin), false);
+        write_entry("TYPE=", pin_type(pin), false);
     }
     if (const HX_SIGNAL* outer = pin->get_outer_signal()) {
         if (opened) {
             write_item(" ");
         } else {
-            write_pair(" ", "(");
+            write_joined(" (", true);
             opened = 1;
         }
-        write_entry("", "CONN", vrx_legal(outer->get_name(), outer).view(), false);
+        write_entry("CONN=", vrx_legal(outer->get_name(), outer).view(), false);
     }
     write_blkpin_props(pin, block, &opened);
     if (opened)
-        write_pair(")", "\r\n");
+        end_line(")");
     else
         write_string("\r\n", nullptr);
 }
 
 void VRX::write_primpin_props(const HX_PIN_PRIMITIVE* pin, const HX_BLOCK* block, uint8_t root) {
-    write_pair(" ", "(");
-    write_entry("", "NAME", vrx_legal(pin->get_name(), pin).view(), false);
+    write_joined(" (", true);
+    write_entry("NAME=", vrx_legal(pin->get_name(), pin).view(), false);
     if (pin->get_inverted()) write_pair(" ", "INV");
     const HX_SIGNAL* signal = root ? pin->get_inner_signal() : pin->get_outer_signal();
-    if (root || pin->get_role() == kPadRole) write_entry(" ", "TYPE", pin_type(pin), true);
+    if (root || pin->get_role() == kPadRole) write_entry(" TYPE=", pin_type(pin), true);
     if (signal != nullptr)
-        write_entry(" ", "CONN", vrx_legal(signal->get_name(), signal).view(), true);
+        write_entry(" CONN=", vrx_legal(signal->get_name(), signal).view(), true);
     if (!root) {
         uint8_t opened = 1;
         write_prop_list(pin, &opened, block);
     }
-    write_pair(")", "\r\n");
+    end_line(")");
 }
 
 void VRX::write_blkpin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t* opened) {
@@ -249,11 +277,11 @@ void VRX::write_signal_props(HX_BLOCK* block) {
     const char* keyword = block->is_physical() ? "PHYSSIGNAL" : "SIGNAL";
     UT_BLIST_ITER<HX_SIGNAL>* globals = block->create_global_siglist(1);
     while (HX_SIGNAL* g = globals->l_next()) {
-        write_indent(4, keyword, vrx_legal(g->get_name(), g).c_str(), "(", "GLOBAL");
+        write_indent(4, keyword, vrx_legal(g->get_name(), g).view(), "(", "GLOBAL");
         uint8_t opened = 1;
         write_prop_list(g, &opened, nullptr);
         if (const HX_NETWORK* net = g->get_network()) write_prop_list(net, &opened, nullptr);
-        write_pair(")", "\r\n");
+        end_line(")");
     }
     block->delete_global_siglist(globals);
 
@@ -263,14 +291,14 @@ void VRX::write_signal_props(HX_BLOCK* block) {
         const bool own = has_props(s);
         const bool of_net = net != nullptr && net->get_highest_signal() == s && has_props(net);
         if (!own && !of_net) continue;
-        write_indent(2, keyword, vrx_legal(s->get_name(), s).c_str());
+        write_indent(2, keyword, vrx_legal(s->get_name(), s).view());
         uint8_t opened = 0;
         if (own) write_prop_list(s, &opened, nullptr);
         if (of_net) write_prop_list(net, &opened, nullptr);
         // Every property may still have been left out (a time stamp, say):
         // the statement then ends without a list.
         if (opened)
-            write_pair(")", "\r\n");
+            end_line(")");
         else
             write_string("\r\n", nullptr);
     }
@@ -299,7 +327,7 @@ void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
 
 void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_LEGALNAME& label) {
     const HX_MAPSIGNAL* map = pin->get_map_signal();
-    write_indent(2, "MAPSIGNAL", label.c_str());
+    write_indent(2, "MAPSIGNAL", label.view());
     write_pair(" ", vrx_legal(pin->get_name(), pin).view());
     uint8_t opened = 0;
     write_prop_list(map, &opened, nullptr);
@@ -311,8 +339,8 @@ void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const 
         if (target == block) continue;
         const HX_PIN* target_pin = conn->get_pin();
         const VX_LEGALNAME target_label = vrx_legal(build_hiername(target), target).keep();
-        write_indent(3, "MAPCONN", target_label.c_str(),
-                     vrx_legal(target_pin->get_name(), target_pin).c_str());
+        write_indent(3, "MAPCONN", target_label.view(),
+                     vrx_legal(target_pin->get_name(), target_pin).view());
         if (target_pin->get_mapinv()) write_item(" (MAPINV)");
         write_string("\r\n", nullptr);
     }
@@ -331,12 +359,12 @@ void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_LEGALNAME& l
             mapped = child->get_pin(i)->get_map_signal() != nullptr;
         if (mapped) continue;
         if (!opened) {
-            write_indent(2, "MAPSIGNAL", label.c_str());
+            write_indent(2, "MAPSIGNAL", label.view());
             begin_construct();
             opened = true;
         }
         const VX_LEGALNAME child_label = vrx_legal(build_hiername(child), child).keep();
-        write_indent(3, "MAPCONN", child_label.c_str(), "\r\n");
+        write_indent(3, "MAPCONN", child_label.view(), "\r\n");
     }
     block->delete_log_child_iter(children);
     if (opened) end_construct();
@@ -381,15 +409,15 @@ void VRX::traverse(HX_BLOCK* block, uint8_t physical) {
         design_name = vrx_legal(nullptr, block);
         block_name = design_name;
     }
-    write_object_header("DESIGN", block, plain, design_name.c_str(), kNoNumber, 1, 1);
+    write_object_header("DESIGN", block, plain, design_name.view(), kNoNumber, 1, 1);
     begin_construct();
     if (HX_PRIMITIVE* prim = block->get_primitive())
         write_prim_header(prim, physical, 1);
     else
-        write_object_header(physical ? "PHYSBLOCK" : "BLOCK", block, plain, block_name.c_str(),
+        write_object_header(physical ? "PHYSBLOCK" : "BLOCK", block, plain, block_name.view(),
                             block->get_pin_count(), 1, 1);
     write_root_pins(block);
-    for_each_child(block, [&](HX_BLOCK* child) { write_child(child, physical); });
+    for_each_child_ahead(block, [&](HX_BLOCK* child) { write_child(child, physical); });
     write_signal_props(block);
     end_construct();
 }
@@ -418,14 +446,14 @@ void VRX::write_root_header(HX_BLOCK* root, uint8_t physical) {
 
 void VRX::write_root_design() {
     const VX_LEGALNAME name = vrx_legal(design->get_name(), design);
-    write_object_header("DESIGN", design, design->get_name(), name.c_str(), kNoNumber, 1, 0);
+    write_object_header("DESIGN", design, design->get_name(), name.view(), kNoNumber, 1, 0);
     begin_construct();
     if (log_root != nullptr) write_root_header(log_root, 0);
     if (phys_root != nullptr) write_root_header(phys_root, 1);
     if (log_root != nullptr)
-        for_each_child(log_root, [&](HX_BLOCK* child) { write_child(child, 0); });
+        for_each_child_ahead(log_root, [&](HX_BLOCK* child) { write_child(child, 0); });
     if (phys_root != nullptr)
-        for_each_child(phys_root, [&](HX_BLOCK* child) { write_child(child, 1); });
+        for_each_child_ahead(phys_root, [&](HX_BLOCK* child) { write_child(child, 1); });
     if (log_root != nullptr) write_signal_props(log_root);
     if (phys_root != nullptr) {
         write_signal_props(phys_root);

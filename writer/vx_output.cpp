@@ -31,9 +31,6 @@ UT_NCH_CACHE* keyword_cache = nullptr;
 
 // The latest hierarchical name with ".TRANSPARENT"; grows as needed.
 std::string hiername_buffer;
-// The line that write_indent assembles; kept to avoid an allocation per line.
-std::string line_buffer;
-
 bool fatal_seen = false;
 
 const UT_NCH_CACHE& keyword_set() {
@@ -56,29 +53,32 @@ bool is_keyword(const char* name) {
     return keyword_set().find(name) != nullptr;
 }
 
-// Bytes that a bare word cannot hold: blanks, line feeds and separators end
-// or split it. The first four are the format's own quoting rule; the others
-// would otherwise break the written file.
-struct QuoteBytes {
-    bool table[256] = {};
-    constexpr QuoteBytes() {
-        for (unsigned char c : {' ', '(', ')', '=', '\t', '\n', '{', '}'}) table[c] = true;
+// Byte classes for names. A bare word cannot hold blanks, line feeds or
+// separators: they end or split it. The first four of those are the
+// format's own quoting rule; the others would otherwise break the file.
+enum : unsigned char { kStop = 1, kNotDigit = 2 };
+struct NameBytes {
+    unsigned char table[256] = {};
+    constexpr NameBytes() {
+        for (int c = 0; c < 256; ++c) table[c] = (c >= '0' && c <= '9') ? 0 : kNotDigit;
+        table[0] |= kStop;
+        for (unsigned char c : {' ', '(', ')', '=', '\t', '\n', '{', '}'}) table[c] |= kStop;
     }
 };
-constexpr QuoteBytes kQuoteBytes;
+constexpr NameBytes kNameBytes;
 
-bool needs_quotes(const char* name) {
+// True when the name cannot stand bare; `length` receives its length.
+bool needs_quotes(const char* name, std::size_t& length) {
     const auto* p = reinterpret_cast<const unsigned char*>(name);
-    bool digits = true;
+    unsigned char seen = 0;
     std::size_t n = 0;
-    for (; p[n] != 0; ++n) {
-        if (kQuoteBytes.table[p[n]]) return true;
-        digits = digits && p[n] >= '0' && p[n] <= '9';
-    }
+    while (!(kNameBytes.table[p[n]] & kStop)) seen |= kNameBytes.table[p[n++]];
+    if (p[n] != 0) return true;
+    length = n;
     // "//" would start a comment; a digit run with a leading zero would read
     // back as a number without it.
     if (name[0] == '/' && name[1] == '/') return true;
-    return digits && n > 1 && name[0] == '0';
+    return !(seen & kNotDigit) && n > 1 && name[0] == '0';
 }
 
 std::string quoted(const char* name) {
@@ -121,51 +121,64 @@ void vx_append_int(std::string& out, long long value) {
 
 // --- bytes and columns -----------------------------------------------------------
 
-namespace {
-
-int32_t advance(int32_t column, std::size_t count) {
-    const long long next = static_cast<long long>(column) + static_cast<long long>(count);
-    return next > INT32_MAX ? INT32_MAX : static_cast<int32_t>(next);
-}
-
-}  // namespace
-
 void VRX::write_line_end() {
     out_stream->write(kLineEnd.data(), kLineEnd.size());
     column = 0;
 }
 
+// The line-length rule. An item may bring the line to 79; a pair to 80
+// (81 and beyond break). A break comes even at column 0, so an overlong
+// item at the start of a line is preceded by an empty line.
+void VRX::break_before(std::size_t length, bool pair) {
+    const long long total = static_cast<long long>(length) + column;
+    if (total > kLineLimit && !(pair && total == kLineLimit + 1)) write_line_end();
+}
+
 void VRX::write_item(std::string_view item) {
-    if (static_cast<long long>(item.size()) + column > kLineLimit) write_line_end();
-    out_stream->write(item.data(), item.size());
-    column = advance(column, item.size());
+    break_before(item.size(), false);
+    put(item);
 }
 
 void VRX::write_pair(std::string_view first, std::string_view second) {
-    const long long total = static_cast<long long>(first.size()) + second.size() + column;
-    if (total > kLineLimit && total != kLineLimit + 1) write_line_end();
-    out_stream->write(first.data(), first.size());
-    if (second == kLineEnd) {
+    break_before(first.size() + second.size(), true);
+    put(first);
+    if (second == kLineEnd)
         write_line_end();
-        return;
+    else
+        put(second);
+}
+
+// A pair whose two texts are given joined: the same bytes and the same break
+// as writing them as a pair (or, with `pair` clear, as one item).
+void VRX::write_joined(std::string_view bytes, bool pair) {
+    break_before(bytes.size(), pair);
+    put(bytes);
+}
+
+// The pair of `text` and a line end, in one write for the short texts that
+// close lists.
+void VRX::end_line(std::string_view text) {
+    break_before(text.size() + kLineEnd.size(), true);
+    char line[16];
+    if (text.size() + kLineEnd.size() <= sizeof line) {
+        std::memcpy(line, text.data(), text.size());
+        std::memcpy(line + text.size(), kLineEnd.data(), kLineEnd.size());
+        out_stream->write(line, text.size() + kLineEnd.size());
+    } else {
+        out_stream->write(text.data(), text.size());
+        out_stream->write(kLineEnd.data(), kLineEnd.size());
     }
-    out_stream->write(second.data(), second.size());
-    column = advance(column, first.size() + second.size());
+    column = 0;
 }
 
 void VRX::write_string(const char* first, const char* second) {
     if (first == nullptr) {
-        if (second == nullptr) return;
-        out_stream->write(second, std::strlen(second));
-        column = advance(column, std::strlen(second));
+        if (second != nullptr) put(second);
         return;
     }
     if (first == kLineEnd) {
         write_line_end();
-        if (second != nullptr) {
-            out_stream->write(second, std::strlen(second));
-            column = advance(column, std::strlen(second));
-        }
+        if (second != nullptr) put(second);
         return;
     }
     if (second == nullptr)
@@ -174,23 +187,34 @@ void VRX::write_string(const char* first, const char* second) {
         write_pair(first, second);
 }
 
-void VRX::write_indent(int32_t count, const char* word1, const char* word2, const char* word3,
-                       const char* word4) {
-    const char* words[4] = {word1, word2, word3, word4};
+// One indented line, or the start of one: the indentation, then the present
+// words, each after one space unless it stands first. A last word "\r\n" ends
+// the line (the pair rule); otherwise the line stays open for the caller.
+// The pieces go out one by one; their wrap decision is that of the whole line.
+void VRX::write_indent(int32_t count, std::string_view word1, std::string_view word2,
+                       std::string_view word3, std::string_view word4) {
+    const std::string_view words[4] = {word1, word2, word3, word4};
     count = std::clamp(count, 0, 4);
-    line_buffer.clear();
-    for (int16_t level = 0; level < indent; ++level) line_buffer += kIndentUnit;
+    const int levels = indent > 0 ? indent : 0;
+    std::size_t length = static_cast<std::size_t>(levels) * kIndentUnit.size();
+    auto skipped = [](std::string_view w) { return w.data() == nullptr || w == kLineEnd; };
+    for (int32_t i = 0; i < count; ++i)
+        if (!skipped(words[i])) length += words[i].size() + (i > 0 ? 1 : 0);
+    const bool ends = count > 0 && words[count - 1].data() != nullptr && words[count - 1] == kLineEnd;
+    break_before(length + (ends ? kLineEnd.size() : 0), ends);
+    put_indent(levels);
     for (int32_t i = 0; i < count; ++i) {
-        const char* word = words[i];
-        if (word == nullptr || word == kLineEnd) continue;
-        if (i > 0) line_buffer += ' ';
-        line_buffer += word;
+        if (skipped(words[i])) continue;
+        if (i > 0) put(" ");
+        put(words[i]);
     }
-    const char* last = count > 0 ? words[count - 1] : nullptr;
-    if (last != nullptr && last == kLineEnd)
-        write_pair(line_buffer, kLineEnd);
-    else
-        write_item(line_buffer);
+    if (ends) write_line_end();
+}
+
+void VRX::put_indent(int levels) {
+    static const std::string spaces(kIndentUnit.size() * 32, ' ');
+    for (; levels > 32; levels -= 32) put(spaces);
+    put(std::string_view(spaces).substr(0, kIndentUnit.size() * static_cast<std::size_t>(levels)));
 }
 
 void VRX::begin_construct() {
@@ -212,7 +236,12 @@ VX_LEGALNAME VRX::quote_kwd(const char* name) {
 }
 
 VX_LEGALNAME VRX::vrx_legal(const char* name, const void* object) {
-    if (vx_present(name)) return needs_quotes(name) ? VX_LEGALNAME::own(quoted(name)) : quote_kwd(name);
+    if (vx_present(name)) {
+        std::size_t length = 0;
+        if (needs_quotes(name, length)) return VX_LEGALNAME::own(quoted(name));
+        if (is_keyword(name)) return VX_LEGALNAME::own(quoted(name));
+        return VX_LEGALNAME::refer(std::string_view(name, length));
+    }
     if (object == nullptr) return VX_LEGALNAME::refer("\"\"");
     std::string invented;
     vx_append_invented(invented, object);

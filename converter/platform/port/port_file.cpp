@@ -103,12 +103,18 @@ void Stream::attach(int fd, const char* name, bool owns) {
     error_ = 0;
     name_ = name ? name : "";
     begin_ = end_ = 0;
+    update_write_limit();
+}
+
+void Stream::update_write_limit() {
+    write_limit_ = access_ == ACCESS_WRITE && fd_ >= 0 && error_ == 0 ? buffer_.size() : 0;
 }
 
 bool Stream::detach() {
     const bool ok = flush();
     fd_ = -1;
     owns_fd_ = false;
+    update_write_limit();
     return ok;
 }
 
@@ -126,7 +132,7 @@ bool Stream::open_path(const char* name) {
     return true;
 }
 
-bool Stream::write(const void* bytes, std::size_t count) {
+bool Stream::write_through(const void* bytes, std::size_t count) {
     if (access_ != ACCESS_WRITE || fd_ < 0) {
         if (error_ == 0) error_ = EBADF;
         return false;
@@ -136,6 +142,7 @@ bool Stream::write(const void* bytes, std::size_t count) {
         if (!flush()) return false;
         if (count >= buffer_.size()) {  // large pieces bypass the buffer
             if (!write_all(fd_, bytes, count)) error_ = errno;
+            update_write_limit();
             return error_ == 0;
         }
     }
@@ -155,6 +162,7 @@ bool Stream::flush() {
         if (!write_all(fd_, buffer_.data(), end_)) error_ = errno;
         end_ = 0;
     }
+    update_write_limit();
     return error_ == 0;
 }
 
@@ -196,6 +204,7 @@ bool Stream::close_file() {
     }
     fd_ = -1;
     owns_fd_ = false;
+    update_write_limit();
     return ok;
 }
 
@@ -271,21 +280,52 @@ bool File::close(UT_PTRFILE* file) {
     return file != nullptr && file->close();
 }
 
+namespace {
+
+// Copies in the kernel where it can (no trip through user memory; a clone of
+// the extents on file systems that share them). False with `handled` clear
+// when the kernel cannot copy these files at all, so the caller falls back.
+bool copy_in_kernel(int in, int out, bool& handled) {
+    handled = false;
+    for (;;) {
+        const ssize_t n = ::copy_file_range(in, nullptr, out, nullptr, kCopyChunk * 64, 0);
+        if (n == 0) return true;
+        if (n > 0) {
+            handled = true;
+            continue;
+        }
+        if (errno == EINTR) continue;
+        // Not supported here (another file system, an old kernel): only an
+        // error once bytes have moved.
+        if (!handled && (errno == EXDEV || errno == ENOSYS || errno == EOPNOTSUPP ||
+                         errno == EINVAL)) return false;
+        handled = true;
+        return false;
+    }
+}
+
+bool copy_through_buffer(int in, int out) {
+    std::vector<char> chunk(kCopyChunk);
+    for (;;) {
+        const ssize_t n = ::read(in, chunk.data(), chunk.size());
+        if (n < 0 && errno == EINTR) continue;
+        if (n <= 0) return n == 0;
+        if (!write_all(out, chunk.data(), static_cast<std::size_t>(n))) return false;
+    }
+}
+
+}  // namespace
+
 bool File::copy(const char* from, const char* to) {
     if (from == nullptr || to == nullptr) return false;
     const int in = ::open(from, O_RDONLY | O_CLOEXEC);
     if (in < 0) return false;
     ReplaceFile out;
     bool ok = out.create(to);
-    std::vector<char> chunk(ok ? kCopyChunk : 0);
-    while (ok) {
-        const ssize_t n = ::read(in, chunk.data(), chunk.size());
-        if (n < 0 && errno == EINTR) continue;
-        if (n <= 0) {
-            ok = n == 0;
-            break;
-        }
-        ok = write_all(out.fd(), chunk.data(), static_cast<std::size_t>(n));
+    if (ok) {
+        bool handled = false;
+        ok = copy_in_kernel(in, out.fd(), handled);
+        if (!ok && !handled) ok = copy_through_buffer(in, out.fd());
     }
     ::close(in);
     return ok && out.commit();

@@ -12,6 +12,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstring>
 #include <string>
 #include <vector>
 
@@ -29,7 +30,16 @@ class Stream {
     Stream& operator=(const Stream&) = delete;
 
     /// Writes exactly count bytes (buffered). False once any write has failed.
-    bool write(const void* bytes, std::size_t count);
+    /// Pieces that fit the buffer are copied in place; the rest goes out of line.
+    bool write(const void* bytes, std::size_t count) {
+        // write_limit_ is the buffer's size while writing is possible, else 0.
+        if (end_ <= write_limit_ && count <= write_limit_ - end_) {
+            copy_bytes(buffer_.data() + end_, static_cast<const char*>(bytes), count);
+            end_ += count;
+            return true;
+        }
+        return write_through(bytes, count);
+    }
     /// Writes the text followed by the line end "\r\n".
     bool writeline(const char* text);
     /// Reads up to count bytes; fewer only at the end of the file or on an error.
@@ -51,6 +61,32 @@ class Stream {
 
   private:
     friend class File;
+    // Writers hand over many short pieces; copying those with fixed-size
+    // moves saves a library call each. Only bytes of [from, from + count)
+    // are read and only [to, to + count) written.
+    static void copy_bytes(char* to, const char* from, std::size_t count) {
+        if (count > 16) {
+            std::memcpy(to, from, count);
+        } else if (count >= 8) {
+            char head[8], tail[8];
+            std::memcpy(head, from, 8);
+            std::memcpy(tail, from + count - 8, 8);
+            std::memcpy(to, head, 8);
+            std::memcpy(to + count - 8, tail, 8);
+        } else if (count >= 4) {
+            char head[4], tail[4];
+            std::memcpy(head, from, 4);
+            std::memcpy(tail, from + count - 4, 4);
+            std::memcpy(to, head, 4);
+            std::memcpy(to + count - 4, tail, 4);
+        } else if (count > 0) {
+            to[0] = from[0];
+            to[count / 2] = from[count / 2];
+            to[count - 1] = from[count - 1];
+        }
+    }
+    bool write_through(const void* bytes, std::size_t count);
+    void update_write_limit();
     bool open_path(const char* name);
     bool close_file();
     bool fill();
@@ -63,6 +99,7 @@ class Stream {
     std::vector<char> buffer_;
     std::size_t begin_ = 0;  // read: first unread byte
     std::size_t end_ = 0;    // read: end of valid bytes; write: bytes pending
+    std::size_t write_limit_ = 0;
 };
 
 class File {

@@ -1,0 +1,283 @@
+#include <algorithm>
+#include <memory>
+#include <regex>
+#include <string>
+
+#include "file_size_limit.h"
+#include "hx_library.h"
+#include "scoped_env.h"
+#include "writer_access.h"
+
+namespace writer_test {
+namespace {
+
+// The converter's own wording of these failures; an empty text accepts any error.
+std::string not_a_database_file(const std::string& /*path*/) { return ""; }
+std::string nothing_loaded(const std::string& /*path*/) { return ""; }
+std::string write_failed(const std::string& /*path*/) { return ""; }
+
+const std::string kHeaderLine2 = "// $Header: basvrxwrite,v 1.1 2003/01/23 19:53:39 Exp $\r\n";
+
+const char* const kSmallDesign = R"(
+DESIGN d (DP="x y") {
+   BLOCK top 1 (NAME=top) {
+      PIN a (TYPE=IN CONN=a)
+   }
+   PRIM OR 2 (NAME=g) {
+      PIN IN (NAME=IN0)
+      PIN IN (NAME=IN1 CONN=a)
+      PIN OUT (NAME=OUT)
+   }
+   SIGNAL a (SP=2)
+}
+)";
+
+/// Temporary files go to a directory of the test's own, to show that none is left behind.
+class PipelineTest : public WriterFixture {
+  protected:
+    void make_small_design() {
+        design->create_prop("DP", "x y", 1);
+        HX_LOGBLOCK* top = design->create_logblock(nullptr, 1, "top");
+        name_pin(top, 0, "a", HX_PIN_IN);
+        HX_SIGNAL* a = design->create_signal(top, "a");
+        a->create_prop("SP", 2);
+        design->create_conn(a, top, 0);
+        design->create_conn(a, design->create_logprim(top, HX_PRIM_OR, 2, "g"), 1);
+    }
+    void select_design() {
+        A::design(vrx) = design;
+        A::is_design(vrx) = 1;
+    }
+    /// A destination that holds something already.
+    std::string old_destination() {
+        const std::string path = dir.file("old.vrx");
+        ScratchDir::write_file(path, "old");
+        return path;
+    }
+    /// Expects one error at least; when `expected` is not empty, one of them is it.
+    void expect_failure_reported(const std::string& expected) {
+        const std::vector<std::string> texts = errors();
+        EXPECT_FALSE(texts.empty());
+        if (!expected.empty()) {
+            EXPECT_NE(std::find(texts.begin(), texts.end(), expected), texts.end()) << expected;
+        }
+    }
+    /// Expects `expected` at `level` exactly once, from the pipeline's own source.
+    void expect_pipeline_report(Port_MsgLevel level, const std::string& expected) {
+        int found = 0;
+        for (const CapturedMsg& m : capture.messages()) {
+            if (m.level != level || m.text != expected) continue;
+            ++found;
+            EXPECT_EQ(m.module, "Quorra");
+            EXPECT_EQ(m.file, "../s/basvrxwrite");
+            EXPECT_EQ(m.revision, "$Revision: 1.1 $");
+        }
+        EXPECT_EQ(found, 1) << expected;
+    }
+    /// The destination holds `content` (null: it does not exist); no temporary file stays.
+    void expect_untouched(const std::string& destination, const char* content) {
+        if (content == nullptr) {
+            EXPECT_FALSE(ScratchDir::exists(destination));
+        } else {
+            EXPECT_EQ(ScratchDir::read_file(destination), content);
+        }
+        EXPECT_EQ(tmp.entries(), std::vector<std::string>{});
+    }
+    static void write_db_file(const std::string& path, HX_DESIGN* d, HX_LIBRARY* l) {
+        UT_PTRFILE file(Port::ACCESS_WRITE);
+        ASSERT_NE(Port::File::open(path.c_str(), &file, false), nullptr);
+        ASSERT_TRUE(d ? hx_env.write_design(&file, d) : hx_env.write_library(&file, l));
+        ASSERT_TRUE(Port::File::close(&file));
+    }
+
+    ScratchDir tmp;
+    ScopedEnv tmpdir{"TMPDIR", tmp.path().c_str()};
+};
+
+TEST_F(PipelineTest, FileStartsWithTheTwoHeaderLines) {
+    select_design();
+    A::indent(vrx) = 2;  // whatever came before, a file starts at column 0
+    A::column(vrx) = 75;
+    const std::string path = dir.file("out.vrx");
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
+    const std::string written = ScratchDir::read_file(path);
+    const std::regex layout(
+        "// Created [0-9]{2}:[0-9]{2}:[0-9]{2}, [A-Z][a-z]{2} [1-9][0-9]?, [0-9]{4}\\. "
+        "by Vondrel package hxb2vrx: Version Quillate\r\n"
+        "([^\r\n]*\r\n)"
+        "DESIGN d \\{\r\n\\}\r\n");
+    std::smatch match;
+    ASSERT_TRUE(std::regex_match(written, match, layout)) << written;
+    EXPECT_EQ(match[1].str(), kHeaderLine2);
+    expect_pipeline_report(PORT_MSG_STATUS, "   writing VRX file '" + path + "' ...\n");
+    EXPECT_EQ(errors(), std::vector<std::string>{});
+    expect_untouched(path, written.c_str());
+}
+
+TEST_F(PipelineTest, DesignFileReadsBackToTheSameText) {
+    make_small_design();
+    EXPECT_EQ(body(), text(kSmallDesign));
+    const std::string file = dir.file("d.hxb");
+    write_db_file(file, design, nullptr);
+    capture.clear();
+    ASSERT_EQ(vrx.hxb_read(file.c_str()), VX_OK);
+    expect_pipeline_report(PORT_MSG_STATUS, "   reading design from '" + file + "' ...\n");
+    ASSERT_NE(vrx.get_design(), design);
+    EXPECT_STREQ(vrx.get_design()->get_name(), "d");
+    EXPECT_EQ(A::is_design(vrx), 1);
+    const std::string path = dir.file("again.vrx");
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
+    const std::string written = ScratchDir::read_file(path);
+    EXPECT_EQ(written.substr(written.find(kHeaderLine2) + kHeaderLine2.size()), text(kSmallDesign));
+}
+
+TEST_F(PipelineTest, LibraryFileWritesItsPropertiesThenEachDesign) {
+    HX_LIBRARY source("L", 0);
+    source.create_prop("LP", 1);
+    source.create_prop("LF", HX_PROP_FLAG);
+    source.create_design("d1")->create_logblock(nullptr, 0, "t1");
+    source.create_design("d2")->create_logblock(nullptr, 0, "t2");
+    const std::string file = dir.file("l.hxl");
+    write_db_file(file, nullptr, &source);
+    ASSERT_EQ(vrx.hxb_read(file.c_str()), VX_OK);
+    EXPECT_EQ(A::is_design(vrx), 0);
+    ASSERT_NE(vrx.get_library(), nullptr);
+
+    const std::string path = dir.file("l.vrx");
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
+    const std::string written = ScratchDir::read_file(path);
+    ASSERT_EQ(written.find(kHeaderLine2), written.find("\r\n") + 2);
+    EXPECT_EQ(written.substr(written.find(kHeaderLine2) + kHeaderLine2.size()), text(R"(
+ (LP=1 LF)
+DESIGN d1 {
+   BLOCK t1 0 (NAME=t1) {
+   }
+}
+DESIGN d2 {
+   BLOCK t2 0 (NAME=t2) {
+   }
+}
+)"));
+    EXPECT_EQ(capture.texts(PORT_MSG_STATUS),
+              (std::vector<std::string>{"   reading library from '" + file + "' ...\n",
+                                        "   writing VRX file '" + path + "' ...\n",
+                                        "   processing design d1 ...\n",
+                                        "   processing design d2 ...\n"}));
+    expect_pipeline_report(PORT_MSG_STATUS, "   processing design d2 ...\n");
+    EXPECT_EQ(errors(), std::vector<std::string>{});
+
+    HX_LIBRARY empty("E", 0);  // no designs, no properties: the header lines only
+    A::library(vrx) = &empty;
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
+    const std::string header_only = ScratchDir::read_file(path);
+    EXPECT_EQ(header_only.substr(header_only.find("\r\n") + 2), kHeaderLine2);
+    A::library(vrx) = nullptr;
+}
+
+TEST_F(PipelineTest, InputFilesThatCannotBeLoadedLeaveWhatWasLoaded) {
+    select_design();
+    const std::string missing = dir.file("missing.hxb");
+    EXPECT_EQ(vrx.hxb_read(missing.c_str()), VX_FILE_ERROR);
+    EXPECT_EQ(errors(), std::vector<std::string>{"cannot open input file '" + missing + "'\n"});
+    expect_pipeline_report(PORT_MSG_ERROR, "cannot open input file '" + missing + "'\n");
+
+    const std::string garbage = dir.file("garbage.hxb");
+    ScratchDir::write_file(garbage, "this is no database file\n");
+    capture.clear();
+    EXPECT_EQ(vrx.hxb_read(garbage.c_str()), VX_FILE_ERROR);
+    expect_failure_reported(not_a_database_file(garbage));
+
+    make_small_design();
+    const std::string damaged = dir.file("damaged.hxb");
+    write_db_file(damaged, design, nullptr);
+    std::string bytes = ScratchDir::read_file(damaged);
+    bytes[bytes.size() - 3] ^= 0x5a;
+    ScratchDir::write_file(damaged, bytes);
+    capture.clear();
+    EXPECT_EQ(vrx.hxb_read(damaged.c_str()), VX_FILE_ERROR);  // refused by the database
+    expect_failure_reported("");
+
+    EXPECT_EQ(vrx.get_design(), design);
+    EXPECT_EQ(vrx.get_library(), nullptr);
+    EXPECT_EQ(A::is_design(vrx), 1);
+}
+
+// --- failed writes: the destination stays as it was and no temporary file stays ---------
+
+TEST_F(PipelineTest, NothingLoaded) {
+    const std::string path = dir.file("none.vrx");
+    EXPECT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_FILE_ERROR);
+    expect_failure_reported(nothing_loaded(path));
+    expect_untouched(path, nullptr);
+}
+
+TEST_F(PipelineTest, UnreadableFilterFile) {
+    select_design();
+    const std::string path = old_destination();
+    const std::string filter = dir.file("missing.flt");
+    EXPECT_EQ(vrx.vrx_write(path.c_str(), filter.c_str(), 0), VX_FILE_ERROR);
+    expect_pipeline_report(PORT_MSG_ERROR, "error reading property filter file '" + filter + "'\n");
+    expect_untouched(path, "old");
+}
+
+TEST_F(PipelineTest, DestinationInAMissingDirectory) {
+    select_design();
+    const std::string path = dir.file("no/such/dir/out.vrx");
+    EXPECT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_FILE_ERROR);
+    ASSERT_EQ(errors().size(), 1u);
+    const std::regex copy_failed("Unable to copy temporary file '" + tmp.path() + "/[^']+' to '" +
+                                 path + "'\\.\n");
+    EXPECT_TRUE(std::regex_match(errors()[0], copy_failed)) << errors()[0];
+    expect_pipeline_report(PORT_MSG_ERROR, errors()[0]);
+    expect_untouched(path, nullptr);
+}
+
+TEST_F(PipelineTest, DiskFullWhileWriting) {
+    make_small_design();
+    select_design();
+    const std::string path = old_destination();
+    {
+        FileSizeLimit limit(64);
+        EXPECT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_FILE_ERROR);
+    }
+    expect_failure_reported(write_failed(path));
+    // Found when the file is closed, not left to the copy (which the limit happens to stop too).
+    for (const std::string& error : errors()) {
+        EXPECT_EQ(error.find("Unable to copy"), std::string::npos) << error;
+    }
+    expect_untouched(path, "old");
+}
+
+TEST_F(PipelineTest, FatalReportWhoseHandlerReturnsFailsTheWrite) {
+    make_small_design();
+    select_design();
+    HX_PIN* pin = design->get_log_root()->get_pin(0);
+    pin->set_dir(9);  // no pin type has this value
+    const std::string path = old_destination();
+    EXPECT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_FILE_ERROR);
+    EXPECT_EQ(capture.exits(), std::vector<int>{2});
+    EXPECT_EQ(capture.texts(PORT_MSG_FATAL),
+              std::vector<std::string>{"cannot find pin type name for pin 'a'\n"});
+    for (const CapturedMsg& m : capture.messages()) {
+        if (m.level == PORT_MSG_FATAL) {
+            EXPECT_EQ(m.file + " " + m.revision, "basvxwrite $Revision: 1.3 $");
+        }
+    }
+    expect_untouched(path, "old");
+
+    pin->set_dir(HX_PIN_IN);
+    design->create_prop(std::make_unique<HX_PROPERTY>("ODD", static_cast<HX_PROP_TYPE>(42)),
+                        nullptr);
+    capture.clear();
+    EXPECT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_FILE_ERROR);
+    EXPECT_EQ(capture.exits(), std::vector<int>{2});
+    EXPECT_EQ(capture.texts(PORT_MSG_FATAL), std::vector<std::string>{"invalid property type.\n"});
+    expect_untouched(path, "old");
+
+    design->delete_prop("ODD", 0);  // the converter writes on as before
+    capture.clear();
+    EXPECT_EQ(body(), text(kSmallDesign));
+}
+
+}  // namespace
+}  // namespace writer_test
