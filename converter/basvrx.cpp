@@ -138,8 +138,3 @@ void VRX::init_curr_indices(uint16_t value) {
 void VRX::set_parser_status(VX_PARSER_STATUS status) {
     parser_status = status;
 }
-
-// The reader's diagnostics mark the parse failed through this callback.
-void vrx_set_parser_status(VX_PARSER_STATUS status) {
-    if (active_vrx) active_vrx->set_parser_status(status);
-}

@@ -98,8 +98,8 @@ VX_STATUS VRX::hxb_read(const char* path) {
 VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit_user_flag) {
     omit_user = omit_user_flag;
     if ((is_design ? static_cast<void*>(design) : static_cast<void*>(library)) == nullptr) {
-        write_msg(__LINE__).issueError("no %s has been read to write to '%s'\n",
-                                       is_design ? "design" : "library", vx_text(path));
+        write_msg(__LINE__).issueError("no design or library has been read to write to '%s'\n",
+                                       vx_text(path));
         return VX_FILE_ERROR;
     }
     if (path == nullptr || *path == '\0') {

@@ -5,6 +5,12 @@
 // The property filter, when given, renames or drops each property first.
 // Net tags of merge records are written as the name of the net they stand
 // for, so that the text holds nothing that only the database knows.
+//
+// Every name and value is one token that reads back as itself: property
+// names are quoted by the rule for object names, and the formatted timing,
+// pin-reference and timing-string texts and parameter values are quoted by
+// the same rule as names when they would not (a blank, a separator, a
+// keyword, an empty text).
 #include <cstdio>
 #include <cstring>
 
@@ -28,7 +34,7 @@ bool names_net_tag(const char* name) {
 
 // Starts the text of a property: the lead-in that opens the list or follows
 // the one before, then the name.
-void begin_text(uint8_t opened, const char* name) {
+void begin_text(uint8_t opened, std::string_view name) {
     prop_text.assign(opened ? " " : " (");
     prop_text += name;
 }
@@ -48,19 +54,20 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
         if (mapped == nullptr) return;
         prop = mapped;
     }
+    const VX_LEGALNAME token = vrx_legal(prop->get_name(), nullptr);
     const char* name = prop->get_name();
     switch (prop->get_kind()) {
         case HX_PROP_FLAG:
             if (*opened) {
-                write_pair(" ", name);
+                write_pair(" ", token.view());
                 return;
             }
-            begin_text(*opened, name);
+            begin_text(*opened, token.view());
             break;
         case HX_PROP_INT: {
             if (std::strcmp(name, "CREATE_TIMESTAMP") == 0) return;
             const int32_t value = prop->get_int();
-            begin_text(*opened, name);
+            begin_text(*opened, token.view());
             prop_text += '=';
             if (names_net_tag(name)) {
                 const HX_NETWORK* net =
@@ -77,12 +84,12 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
             break;
         }
         case HX_PROP_FLOAT:
-            begin_text(*opened, name);
+            begin_text(*opened, token.view());
             prop_text += '=';
             append_float(prop->get_float());
             break;
         case HX_PROP_STRING:
-            begin_text(*opened, name);
+            begin_text(*opened, token.view());
             prop_text += '=';
             prop_text += vrx_legal(vx_text(prop->get_text()), nullptr).view();
             break;
@@ -92,9 +99,9 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
         case HX_PROP_TIMING: {
             HX_PROP_TIMING_DATA record{INT32_MIN, INT32_MIN, 3};
             prop->get_timing(record);
-            begin_text(*opened, name);
+            begin_text(*opened, token.view());
             prop_text += '=';
-            prop_text += Hxb_Util::form_timing(record);
+            prop_text += vrx_legal(Hxb_Util::form_timing(record).c_str(), nullptr).view();
             break;
         }
         case HX_PROP_PINREF: {
@@ -105,9 +112,9 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
             }
             HX_PROP_PINREF_DATA record{INT32_MIN, INT32_MIN, 3, 65535, 3, 0};
             prop->get_pinref(record);
-            begin_text(*opened, name);
+            begin_text(*opened, token.view());
             prop_text += '=';
-            prop_text += Hxb_Util::form_pinref(record, block);
+            prop_text += vrx_legal(Hxb_Util::form_pinref(record, block).c_str(), nullptr).view();
             break;
         }
         case HX_PROP_PARAM: {
@@ -116,15 +123,15 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
                 vx_write_fatal(__LINE__, "parameter %s with NULL value", name);
                 return;
             }
-            begin_text(*opened, name);
-            prop_text += "=@";
-            prop_text += value;
+            begin_text(*opened, token.view());
+            prop_text += '=';
+            prop_text += vrx_legal(("@" + std::string(value)).c_str(), nullptr).view();
             break;
         }
         case HX_PROP_TIMINGSTR:
-            begin_text(*opened, name);
+            begin_text(*opened, token.view());
             prop_text += '=';
-            prop_text += Hxb_Util::form_timingstr(prop);
+            prop_text += vrx_legal(Hxb_Util::form_timingstr(prop).c_str(), nullptr).view();
             break;
         default:
             vx_write_fatal(__LINE__, "invalid property type.\n");

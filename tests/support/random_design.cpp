@@ -1,5 +1,6 @@
 #include "random_design.h"
 
+#include <cstring>
 #include <climits>
 #include <cmath>
 #include <random>
@@ -55,7 +56,7 @@ class Generator {
         if (roll < 12) return "";
         name_ = stem + std::to_string(++counter_);
         if (roll < 16) name_ += " with space";
-        if (roll < 19) name_ += "\"q\\\xc3\xa9";
+        if (roll < 19) name_ += options_.quotes_in_names ? "\"q\\\xc3\xa9" : "(q)\\\xc3\xa9{}";
         return name_.c_str();
     }
 
@@ -289,7 +290,8 @@ class Generator {
     const char* text() {
         static const char* const kTexts[] = {
             "", "abc", "two words", "q\"uote\\", "\xc3\xa9t\xc3\xa9", "line\tend", "@not a param"};
-        return kTexts[below(std::size(kTexts))];
+        const char* text = kTexts[below(std::size(kTexts))];
+        return options_.quotes_in_names || std::strchr(text, '"') == nullptr ? text : "q'uote\\";
     }
 
     int32_t time_value() {

@@ -26,6 +26,9 @@ struct RandomDesignOptions {
     int props = 40;         ///< properties spread over the objects
     int map_signals = 6;    ///< map signals on physical pins
     int merges = 2;         ///< signals merged into global signals
+    /// Names and text values with a double quote now and then. The text
+    /// format cannot carry those, so tests of written text turn this off.
+    bool quotes_in_names = true;
 };
 
 /// Fills an empty design with random content drawn from `seed`.

@@ -219,30 +219,6 @@ DESIGN d {
 )"));
 }
 
-TEST_F(DesignWriterTest, PhysicalOnlyDesign) {
-    HX_PHYSBLOCK* ptop = design->create_physblock(nullptr, 1, "ptop");
-    name_pin(ptop, 0, "io", HX_PIN_BI);
-    HX_SIGNAL* ps = design->create_signal(ptop, "ps");
-    ps->create_prop("W", 1);
-    design->create_conn(ps, ptop, 0);
-    design->create_physblock(ptop, 0, "pu")->set_user(1);  // USER is for logical blocks only
-    design->create_conn(ps, design->create_physprim(ptop, HX_PRIM_BUF, 0, "pg"), 0);
-    EXPECT_EQ(body(), text(R"(
-DESIGN d {
-   PHYSBLOCK ptop 1 (NAME=ptop) {
-      PIN io (TYPE=BI CONN=ps)
-   }
-   PHYSBLOCK ptop/pu 0 (NAME=pu) {
-   }
-   PHYSPRIM BUF (NAME=pg) {
-      PIN IN (NAME=IN CONN=ps)
-      PIN OUT (NAME=OUT)
-   }
-   PHYSSIGNAL ps (W=1)
-}
-)"));
-}
-
 TEST_F(DesignWriterTest, SignalStatementsCarryGlobalsAndProperties) {
     HX_LOGBLOCK* top = design->create_logblock(nullptr, 1, "top");
     name_pin(top, 0, "o", HX_PIN_OUT);
@@ -331,7 +307,9 @@ TEST_F(DesignWriterTest, MapSignalsAndUnmappedLogicalChildren) {
     HX_PHYSBLOCK* pb = design->create_physblock(ptop, 2, "pb");
     name_pin(pb, 0, "p0", HX_PIN_NOTYPE);
     name_pin(pb, 1, "p1", HX_PIN_NOTYPE);
+    pb->set_user(1);  // USER is for logical blocks only
     HX_PHYSBLOCK* pc = design->create_physblock(pb, 1, "pc");
+    design->create_physprim(ptop, HX_PRIM_BUF, 0, "pg");
     name_pin(pc, 0, "x", HX_PIN_NOTYPE);
     design->create_signal(ptop, "ps")->create_prop("W", 1);
     HX_MAPSIGNAL* m1 = pb->create_map_signal(0, "m1");
@@ -374,6 +352,10 @@ DESIGN d {
    PHYSBLOCK ptop/pb (NAME=pb) {
       PIN p0
       PIN p1
+   }
+   PHYSPRIM BUF (NAME=pg) {
+      PIN IN (NAME=IN)
+      PIN OUT (NAME=OUT)
    }
    PHYSSIGNAL ps (W=1)
    MAPSIGNAL ptop/pb/pc x {

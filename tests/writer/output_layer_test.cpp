@@ -55,8 +55,8 @@ TEST_F(OutputLayerTest, LineBreaksOfItemsPairsAndLineEnds) {
 }
 
 TEST_F(OutputLayerTest, IndentedLines) {
-    auto indent = [&](int16_t level, int32_t column, int32_t count, const char* w1,
-                      const char* w2, const char* w3 = nullptr, const char* w4 = nullptr) {
+    auto indent = [&](int16_t level, int32_t column, int32_t count, const char* w1, const char* w2,
+                      const char* w3 = nullptr, const char* w4 = nullptr) {
         return run(column, level, [&] { A::write_indent(vrx, count, w1, w2, w3, w4); });
     };
     EXPECT_EQ(indent(2, 0, 2, "}", "\r\n"), "      }\r\n");
@@ -73,8 +73,7 @@ TEST_F(OutputLayerTest, IndentedLines) {
     EXPECT_EQ(indent(1, 75, 2, "PIN", "abc"), "\r\n   PIN abc");
     // Longer than any fixed line buffer: written whole.
     const std::string name(1500, 'n');
-    EXPECT_EQ(indent(3, 0, 3, "PIN", name.c_str(), "\r\n"),
-              "\r\n         PIN " + name + "\r\n");
+    EXPECT_EQ(indent(3, 0, 3, "PIN", name.c_str(), "\r\n"), "\r\n         PIN " + name + "\r\n");
 }
 
 TEST_F(OutputLayerTest, ConstructsNestAndCloseAtTheOpeningIndent) {
@@ -106,10 +105,13 @@ TEST_F(OutputLayerTest, NamesAreQuotedWhenTheReaderWouldNotReadThemBack) {
                              "a-1", "x.y", "a\"b"}) {
         EXPECT_EQ(A::vrx_legal(vrx, bare, nullptr), bare);
     }
-    for (const char* name : {"a=b", "x(3)", "x)", "a b", "PIN x", "a\tb", "a\nb", "a{b", "}",
-                             "//x", "//", "007", "00", "DESIGN", "BLOCK", "PHYSBLOCK", "PRIM",
-                             "PHYSPRIM", "SIGNAL", "PHYSSIGNAL", "PIN", "MAPSIGNAL", "MAPCONN"}) {
-        EXPECT_EQ(A::vrx_legal(vrx, name, nullptr), '"' + std::string(name) + '"') << name;
+    const std::vector<std::string> quoted = {"a=b", "x(3)", "x)", "a b", "PIN x", "a\tb", "a\nb",
+                                             "a{b", "}", "//x", "//", "007", "00",
+                                             // The ten statement keywords, exactly as written.
+                                             "DESIGN", "BLOCK", "PHYSBLOCK", "PRIM", "PHYSPRIM",
+                                             "SIGNAL", "PHYSSIGNAL", "PIN", "MAPSIGNAL", "MAPCONN"};
+    for (const std::string& name : quoted) {
+        EXPECT_EQ(A::vrx_legal(vrx, name.c_str(), nullptr), '"' + name + '"') << name;
     }
     EXPECT_EQ(A::quote_kwd(vrx, "MAPCONN"), "\"MAPCONN\"");
     EXPECT_EQ(A::quote_kwd(vrx, "a b"), "a b");  // keywords only

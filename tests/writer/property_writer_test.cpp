@@ -44,13 +44,15 @@ TEST_F(PropertyWriterTest, ValuesOfEveryWrittenKind) {
     HX_OBJECT second;
     second.create_prop(HX_PROPERTY::make_timing("MAXDELAY", {2, 5, HX_UNIT_NS}), nullptr);
     second.create_prop(HX_PROPERTY::make_timing("SETUP", {}), nullptr);
-    // Timing strings and parameters are never quoted.
+    // Timing strings and parameters are quoted only where a bare word would
+    // not read back whole.
     second.create_prop(HX_PROPERTY::make_text("TIMESPEC", HX_PROP_TIMINGSTR, "TS a"), nullptr);
     second.create_prop(HX_PROPERTY::make_text("P", HX_PROP_PARAM, "x y"), nullptr);
     second.create_prop("CREATE_TIMESTAMP", "t", 1);  // skipped only as an integer
     second.create_prop("F", HX_PROP_FLAG);
-    EXPECT_EQ(props(second), " (MAXDELAY=2:5ns SETUP=: TIMESPEC=TS a P=@x y CREATE_TIMESTAMP=t F");
-    EXPECT_EQ(props(second, 1), " MAXDELAY=2:5ns SETUP=: TIMESPEC=TS a P=@x y CREATE_TIMESTAMP=t F");
+    EXPECT_EQ(props(second), " (MAXDELAY=2:5ns SETUP=: TIMESPEC=\"TS a\" P=\"@x y\" CREATE_TIMESTAMP=t F");
+    EXPECT_EQ(props(second, 1),
+              " MAXDELAY=2:5ns SETUP=: TIMESPEC=\"TS a\" P=\"@x y\" CREATE_TIMESTAMP=t F");
     EXPECT_TRUE(capture.messages().empty());
 }
 
@@ -83,8 +85,8 @@ TEST_F(PropertyWriterTest, NetTagsBecomeNetNames) {
     object.create_prop("MERGEDTO", static_cast<int32_t>(clk->get_network()->get_tag()));
     object.create_prop("MERGEDFROM", static_cast<int32_t>(unnamed->get_network()->get_tag()));
     object.create_prop("JOINED", static_cast<int32_t>(spaced->get_network()->get_tag()));
-    EXPECT_EQ(props(object), " (MERGEDTO=clk_net MERGEDFROM=" + obj(unnamed->get_network()) +
-                                 " JOINED=\"a b\"");
+    EXPECT_EQ(props(object),
+              " (MERGEDTO=clk_net MERGEDFROM=" + obj(unnamed->get_network()) + " JOINED=\"a b\"");
     EXPECT_TRUE(capture.messages().empty());
 
     HX_OBJECT missing;

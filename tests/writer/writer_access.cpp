@@ -3,13 +3,27 @@
 #include <cinttypes>
 #include <cstdio>
 
-Port::Stream*& VRX_TEST_ACCESS::out_stream(VRX& v) { return v.out_stream; }
-int32_t& VRX_TEST_ACCESS::column(VRX& v) { return v.column; }
-int16_t& VRX_TEST_ACCESS::indent(VRX& v) { return v.indent; }
-HX_DESIGN*& VRX_TEST_ACCESS::design(VRX& v) { return v.design; }
-HX_LIBRARY*& VRX_TEST_ACCESS::library(VRX& v) { return v.library; }
-uint8_t& VRX_TEST_ACCESS::is_design(VRX& v) { return v.is_design; }
-Hxb_PropFilter*& VRX_TEST_ACCESS::prop_filter(VRX& v) { return v.prop_filter; }
+Port::Stream*& VRX_TEST_ACCESS::out_stream(VRX& v) {
+    return v.out_stream;
+}
+int32_t& VRX_TEST_ACCESS::column(VRX& v) {
+    return v.column;
+}
+int16_t& VRX_TEST_ACCESS::indent(VRX& v) {
+    return v.indent;
+}
+HX_DESIGN*& VRX_TEST_ACCESS::design(VRX& v) {
+    return v.design;
+}
+HX_LIBRARY*& VRX_TEST_ACCESS::library(VRX& v) {
+    return v.library;
+}
+uint8_t& VRX_TEST_ACCESS::is_design(VRX& v) {
+    return v.is_design;
+}
+Hxb_PropFilter*& VRX_TEST_ACCESS::prop_filter(VRX& v) {
+    return v.prop_filter;
+}
 
 void VRX_TEST_ACCESS::write_string(VRX& v, const char* first, const char* second) {
     v.write_string(first, second);
@@ -20,8 +34,12 @@ void VRX_TEST_ACCESS::write_indent(VRX& v, int32_t count, const char* w1, const 
     auto word = [](const char* w) { return w ? std::string_view(w) : std::string_view(); };
     v.write_indent(count, word(w1), word(w2), word(w3), word(w4));
 }
-void VRX_TEST_ACCESS::begin_construct(VRX& v) { v.begin_construct(); }
-void VRX_TEST_ACCESS::end_construct(VRX& v) { v.end_construct(); }
+void VRX_TEST_ACCESS::begin_construct(VRX& v) {
+    v.begin_construct();
+}
+void VRX_TEST_ACCESS::end_construct(VRX& v) {
+    v.end_construct();
+}
 std::string VRX_TEST_ACCESS::quote_kwd(VRX& v, const char* name) {
     return std::string(v.quote_kwd(name).view());
 }
@@ -67,8 +85,7 @@ HX_PIN* name_pin(HX_BLOCK* block, uint16_t index, const char* name, uint8_t dir)
     return pin;
 }
 
-void expect_writer_report(const MsgCapture& capture, Port_MsgLevel level,
-                          const std::string& text) {
+void expect_writer_report(const MsgCapture& capture, Port_MsgLevel level, const std::string& text) {
     std::vector<CapturedMsg> reports;
     for (const CapturedMsg& m : capture.messages()) {
         if (m.level != PORT_MSG_STATUS) reports.push_back(m);
@@ -87,7 +104,9 @@ ScratchStream::ScratchStream(VRX& vrx, const ScratchDir& dir)
     A::out_stream(vrx_) = &stream_;
 }
 
-ScratchStream::~ScratchStream() { A::out_stream(vrx_) = nullptr; }
+ScratchStream::~ScratchStream() {
+    A::out_stream(vrx_) = nullptr;
+}
 
 std::string ScratchStream::bytes() {
     EXPECT_TRUE(Port::File::close(&stream_));
