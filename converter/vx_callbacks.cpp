@@ -1,15 +1,11 @@
-// The text reader's callbacks: each statement it reads reaches the builder
-// operation of the active converter, arguments unchanged, and its
-// diagnostics mark the parse failed. Without an active converter a statement
-// has nowhere to go and is dropped.
+// The text reader's statement callbacks: each statement it reads reaches the
+// builder operation of the active converter, arguments unchanged. Without an
+// active converter a statement has nowhere to go and is dropped.
 //
-// All twelve live in this one file, so that a program may link the converter
-// with callbacks of its own (the parser's tests record them instead).
+// The callbacks live apart from the converter object (the status callback in
+// vx_status_callback.cpp), so that a program may link the converter with
+// callbacks of its own: the parser's tests record them instead.
 #include "vrx.h"
-
-void vrx_set_parser_status(VX_PARSER_STATUS status) {
-    if (active_vrx) active_vrx->set_parser_status(status);
-}
 
 void vrx_do_library_props(VX_PROP_ARRAY* props) {
     if (active_vrx) active_vrx->do_library_props(props);
