@@ -40,37 +40,50 @@ void for_each_child(const HX_BLOCK* block, Fn&& fn) {
 }
 
 // Child statements name the signals on the children's pins, which lie
-// anywhere in the design. Reading a few children ahead and asking for their
-// signals early overlaps those memory reads instead of waiting for each.
-void prefetch_pin_signals(const HX_BLOCK* block) {
-    const uint16_t count = std::min<uint16_t>(block->get_pin_count(), 8);
-    for (uint16_t i = 0; i < count; ++i) {
-        const HX_SIGNAL* signal = block->get_pin(i)->get_outer_signal();
-        if (signal == nullptr) continue;
-        __builtin_prefetch(signal);
-        __builtin_prefetch(reinterpret_cast<const char*>(signal) + 64);  // the name behind it
+// anywhere in the design, and their names lie elsewhere again. Waiting for
+// each of those reads in turn would dominate the writing of a large
+// netlist. The walk over children therefore takes them in batches and reads
+// the signals, then the names, of a whole batch before writing it: reads
+// that do not depend on each other overlap.
+constexpr int kBatch = 16;        // children per batch
+constexpr uint16_t kPinsAhead = 8;  // pins per child read ahead
+
+// A load whose value is not needed. Unlike a prefetch hint it cannot be
+// dropped (hints are, for instance, on pages that a virtual machine has not
+// mapped yet).
+template <class T>
+void touch(T value) {
+    asm volatile("" ::"r"(value));
+}
+
+void read_ahead(HX_BLOCK* const* children, int count) {
+    const char* names[kBatch * kPinsAhead];
+    int n = 0;
+    for (int c = 0; c < count; ++c) {
+        const uint16_t pins = std::min<uint16_t>(children[c]->get_pin_count(), kPinsAhead);
+        for (uint16_t i = 0; i < pins; ++i)
+            if (const HX_SIGNAL* signal = children[c]->get_pin(i)->get_outer_signal())
+                names[n++] = signal->get_name();
     }
+    for (int i = 0; i < n; ++i)
+        if (names[i] != nullptr) touch(*names[i]);
 }
 
 template <class Fn>
 void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
     if (block->child_count() == 0) return;
-    constexpr int kAhead = 8;
-    HX_BLOCK* ring[kAhead];
-    int head = 0;
-    int queued = 0;
+    HX_BLOCK* batch[kBatch];
     UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
     for (;;) {
-        while (queued < kAhead) {
+        int count = 0;
+        while (count < kBatch) {
             HX_BLOCK* next = iter->l_next();
             if (next == nullptr) break;
-            prefetch_pin_signals(next);
-            ring[(head + queued++) % kAhead] = next;
+            batch[count++] = next;
         }
-        if (queued == 0) break;
-        fn(ring[head]);
-        head = (head + 1) % kAhead;
-        --queued;
+        if (count == 0) break;
+        read_ahead(batch, count);
+        for (int c = 0; c < count; ++c) fn(batch[c]);
     }
     block->delete_child_iter(iter);
 }
