@@ -5,17 +5,16 @@
 #include "ut_str.h"
 
 const VX_PRIM_TYPE_ROW vx_prim_types[20] = {
-    {"BUF", 0, 0},       {"CKBUF", 1, 0},    {"AND", 2, 1},       {"OR", 3, 1},
-    {"XOR", 4, 1},       {"MUX", 17, 0},     {"TRI", 5, 0},       {"SFF", 18, 0},
-    {"FF", 6, 0},        {"LATCH", 7, 0},    {"PAD", 8, 0},       {"ONE", 9, 0},
-    {"ZERO", 10, 0},     {"PULLUP", 11, 0},  {"PULLDOWN", 12, 0}, {"RAM", 13, 1},
-    {"RAMS", 15, 1},     {"RAMD", 16, 1},    {"ROM", 14, 1},      {nullptr, 0, 0},
+    {"BUF", 0, 0},  {"CKBUF", 1, 0}, {"AND", 2, 1},   {"OR", 3, 1},      {"XOR", 4, 1},
+    {"MUX", 17, 0}, {"TRI", 5, 0},   {"SFF", 18, 0},  {"FF", 6, 0},      {"LATCH", 7, 0},
+    {"PAD", 8, 0},  {"ONE", 9, 0},   {"ZERO", 10, 0}, {"PULLUP", 11, 0}, {"PULLDOWN", 12, 0},
+    {"RAM", 13, 1}, {"RAMS", 15, 1}, {"RAMD", 16, 1}, {"ROM", 14, 1},    {nullptr, 0, 0},
 };
 
 const VX_TYPE_ROW vx_prim_pin_types[17] = {
-    {"IN", 0},    {"OUT", 1},   {"CTL", 2},   {"SEL", 11}, {"INA", 12},  {"INB", 13},
-    {"ADR", 8},   {"RADR", 9},  {"WADR", 10}, {"CLK", 3},  {"CE", 4},    {"SET", 5},
-    {"RST", 6},   {"SSET", 14}, {"SRST", 15}, {"PAD", 7},  {nullptr, 0},
+    {"IN", 0},  {"OUT", 1},   {"CTL", 2},   {"SEL", 11}, {"INA", 12},  {"INB", 13},
+    {"ADR", 8}, {"RADR", 9},  {"WADR", 10}, {"CLK", 3},  {"CE", 4},    {"SET", 5},
+    {"RST", 6}, {"SSET", 14}, {"SRST", 15}, {"PAD", 7},  {nullptr, 0},
 };
 
 const VX_TYPE_ROW vx_pin_types[6] = {

@@ -119,8 +119,7 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
     const std::unique_ptr<char[]> temp_name(UT_STR::Dup(temp));
     track_temp(temp_name.get());
     if (Port::File::open(temp_name.get(), out_stream, true) == nullptr) {
-        write_msg(__LINE__).issueError("cannot open temporary output file '%s'\n",
-                                       temp_name.get());
+        write_msg(__LINE__).issueError("cannot open temporary output file '%s'\n", temp_name.get());
         discard_output(out_stream, temp_name.get());
         return VX_FILE_ERROR;
     }
@@ -186,10 +185,9 @@ VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
 
 void VRX::write_file_header() {
     const UT_TIMESTAMP now;
-    const std::string stamp = UT_STR::Format("%s:%s:%s, %s %s, %s.", now.get_ts_hour(),
-                                             now.get_ts_minute(), now.get_ts_second(),
-                                             now.get_ts_monthst(), now.get_ts_mday(),
-                                             now.get_ts_year());
+    const std::string stamp = UT_STR::Format(
+        "%s:%s:%s, %s %s, %s.", now.get_ts_hour(), now.get_ts_minute(), now.get_ts_second(),
+        now.get_ts_monthst(), now.get_ts_mday(), now.get_ts_year());
     const std::string line = UT_STR::Format("// Created %s by Vondrel package hxb2vrx: Version %s",
                                             stamp.c_str(), "Quillate");
     write_string(line.c_str(), "\r\n");

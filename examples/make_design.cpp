@@ -11,7 +11,9 @@
 
 namespace {
 
-void connect(HX_DESIGN* d, HX_SIGNAL* s, HX_BLOCK* b, uint16_t pin) { d->create_conn(s, b, pin); }
+void connect(HX_DESIGN* d, HX_SIGNAL* s, HX_BLOCK* b, uint16_t pin) {
+    d->create_conn(s, b, pin);
+}
 
 HX_DESIGN* build() {
     HX_LIBRARY* lib = hx_env.create_library("example", 0);

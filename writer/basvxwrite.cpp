@@ -35,7 +35,8 @@ template <class Fn>
 void for_each_child(const HX_BLOCK* block, Fn&& fn) {
     if (block->child_count() == 0) return;
     UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
-    while (HX_BLOCK* child = iter->l_next()) fn(child);
+    while (HX_BLOCK* child = iter->l_next())
+        fn(child);
     block->delete_child_iter(iter);
 }
 
@@ -45,7 +46,7 @@ void for_each_child(const HX_BLOCK* block, Fn&& fn) {
 // netlist. The walk over children therefore takes them in batches and reads
 // the signals, then the names, of a whole batch before writing it: reads
 // that do not depend on each other overlap.
-constexpr int kBatch = 16;        // children per batch
+constexpr int kBatch = 16;          // children per batch
 constexpr uint16_t kPinsAhead = 8;  // pins per child read ahead
 
 // A load whose value is not needed. Unlike a prefetch hint it cannot be
@@ -83,7 +84,8 @@ void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
         }
         if (count == 0) break;
         read_ahead(batch, count);
-        for (int c = 0; c < count; ++c) fn(batch[c]);
+        for (int c = 0; c < count; ++c)
+            fn(batch[c]);
     }
     block->delete_child_iter(iter);
 }
@@ -118,9 +120,9 @@ const char* VRX::prim_name(const HX_PRIMITIVE* prim, uint16_t index) {
 
 // The database keeps no name common to all objects, so the caller passes the
 // object's name beside the object.
-void VRX::write_object_header(const char* keyword, const HX_OBJECT* object,
-                              const char* object_name, std::string_view given_name, uint16_t number,
-                              uint8_t no_name, uint8_t no_props) {
+void VRX::write_object_header(const char* keyword, const HX_OBJECT* object, const char* object_name,
+                              std::string_view given_name, uint16_t number, uint8_t no_name,
+                              uint8_t no_props) {
     const VX_LEGALNAME label = vrx_legal(object_name, object);
     write_indent(2, keyword, given_name.data() != nullptr ? given_name : label.view());
     char digits[16];
@@ -319,9 +321,8 @@ void VRX::write_signal_props(HX_BLOCK* block) {
 }
 
 void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
-    for_each_child(block, [&](HX_BLOCK* child) {
-        write_map_signals(static_cast<HX_BASEPHYSBLOCK*>(child));
-    });
+    for_each_child(
+        block, [&](HX_BLOCK* child) { write_map_signals(static_cast<HX_BASEPHYSBLOCK*>(child)); });
     VX_LEGALNAME label;
     bool labelled = false;
     auto label_of_block = [&]() -> const VX_LEGALNAME& {
@@ -338,7 +339,8 @@ void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
     write_unmapped_children(block, label_of_block());
 }
 
-void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_LEGALNAME& label) {
+void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin,
+                              const VX_LEGALNAME& label) {
     const HX_MAPSIGNAL* map = pin->get_map_signal();
     write_indent(2, "MAPSIGNAL", label.view());
     write_pair(" ", vrx_legal(pin->get_name(), pin).view());

@@ -47,8 +47,14 @@ bool is_keyword(const char* name) {
     // Every keyword starts with one of these letters and has 3 to 10 bytes;
     // most names fail this test before the set is asked.
     switch (name[0]) {
-        case 'B': case 'D': case 'M': case 'P': case 'S': break;
-        default: return false;
+        case 'B':
+        case 'D':
+        case 'M':
+        case 'P':
+        case 'S':
+            break;
+        default:
+            return false;
     }
     return keyword_set().find(name) != nullptr;
 }
@@ -60,9 +66,11 @@ enum : unsigned char { kStop = 1, kNotDigit = 2 };
 struct NameBytes {
     unsigned char table[256] = {};
     constexpr NameBytes() {
-        for (int c = 0; c < 256; ++c) table[c] = (c >= '0' && c <= '9') ? 0 : kNotDigit;
+        for (int c = 0; c < 256; ++c)
+            table[c] = (c >= '0' && c <= '9') ? 0 : kNotDigit;
         table[0] |= kStop;
-        for (unsigned char c : {' ', '(', ')', '=', '\t', '\n', '{', '}'}) table[c] |= kStop;
+        for (unsigned char c : {' ', '(', ')', '=', '\t', '\n', '{', '}'})
+            table[c] |= kStop;
     }
 };
 constexpr NameBytes kNameBytes;
@@ -72,7 +80,8 @@ bool needs_quotes(const char* name, std::size_t& length) {
     const auto* p = reinterpret_cast<const unsigned char*>(name);
     unsigned char seen = 0;
     std::size_t n = 0;
-    while (!(kNameBytes.table[p[n]] & kStop)) seen |= kNameBytes.table[p[n++]];
+    while (!(kNameBytes.table[p[n]] & kStop))
+        seen |= kNameBytes.table[p[n++]];
     if (p[n] != 0) return true;
     length = n;
     // "//" would start a comment; a digit run with a leading zero would read
@@ -103,8 +112,12 @@ void vx_write_fatal(int line, const char* format, ...) {
     vx_write_msg(line).issueFatal(2, "%s", text.c_str());
 }
 
-bool vx_write_fatal_seen() { return fatal_seen; }
-void vx_write_reset_fatal() { fatal_seen = false; }
+bool vx_write_fatal_seen() {
+    return fatal_seen;
+}
+void vx_write_reset_fatal() {
+    fatal_seen = false;
+}
 
 void vx_append_invented(std::string& out, const void* object) {
     char digits[16];
@@ -200,7 +213,8 @@ void VRX::write_indent(int32_t count, std::string_view word1, std::string_view w
     auto skipped = [](std::string_view w) { return w.data() == nullptr || w == kLineEnd; };
     for (int32_t i = 0; i < count; ++i)
         if (!skipped(words[i])) length += words[i].size() + (i > 0 ? 1 : 0);
-    const bool ends = count > 0 && words[count - 1].data() != nullptr && words[count - 1] == kLineEnd;
+    const bool ends =
+        count > 0 && words[count - 1].data() != nullptr && words[count - 1] == kLineEnd;
     break_before(length + (ends ? kLineEnd.size() : 0), ends);
     put_indent(levels);
     for (int32_t i = 0; i < count; ++i) {
@@ -213,7 +227,8 @@ void VRX::write_indent(int32_t count, std::string_view word1, std::string_view w
 
 void VRX::put_indent(int levels) {
     static const std::string spaces(kIndentUnit.size() * 32, ' ');
-    for (; levels > 32; levels -= 32) put(spaces);
+    for (; levels > 32; levels -= 32)
+        put(spaces);
     put(std::string_view(spaces).substr(0, kIndentUnit.size() * static_cast<std::size_t>(levels)));
 }
 

@@ -73,8 +73,8 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
                 const HX_NETWORK* net =
                     design ? hx_find_net_tag(design, static_cast<uint32_t>(value)) : nullptr;
                 if (net == nullptr) {
-                    vx_write_msg(__LINE__).issueInternal("No net found for tag in %s=%d property.\n",
-                                                         name, value);
+                    vx_write_msg(__LINE__).issueInternal(
+                        "No net found for tag in %s=%d property.\n", name, value);
                     return;
                 }
                 prop_text += vrx_legal(net->get_name(), net).view();
@@ -144,7 +144,8 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
 void VRX::write_prop_list(const HX_OBJECT* object, uint8_t* opened, const HX_BLOCK* block) {
     UT_BLISTS_ITER<HX_PROPERTY>* iter = object->create_prop_iter();
     if (iter == nullptr) return;
-    while (const HX_PROPERTY* prop = iter->l_next()) do_prop(prop, opened, block);
+    while (const HX_PROPERTY* prop = iter->l_next())
+        do_prop(prop, opened, block);
     object->delete_prop_iter(iter);
 }
 

@@ -32,5 +32,9 @@ void vx_append_invented(std::string& out, const void* object);
 void vx_append_int(std::string& out, long long value);
 
 /// Never null: texts that the database may leave absent.
-inline const char* vx_text(const char* s) { return s != nullptr ? s : ""; }
-inline bool vx_present(const char* s) { return s != nullptr && *s != '\0'; }
+inline const char* vx_text(const char* s) {
+    return s != nullptr ? s : "";
+}
+inline bool vx_present(const char* s) {
+    return s != nullptr && *s != '\0';
+}

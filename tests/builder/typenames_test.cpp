@@ -13,7 +13,8 @@ namespace {
 template <class Row>
 int rows_of(const Row* rows) {
     int n = 0;
-    while (rows[n].keyword != nullptr) ++n;
+    while (rows[n].keyword != nullptr)
+        ++n;
     return n;
 }
 

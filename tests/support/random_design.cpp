@@ -1,8 +1,8 @@
 #include "random_design.h"
 
-#include <cstring>
 #include <climits>
 #include <cmath>
+#include <cstring>
 #include <random>
 #include <string>
 #include <unordered_map>

@@ -71,7 +71,8 @@ class PipelineTest : public WriterFixture {
         const std::vector<std::string> texts = errors();
         EXPECT_TRUE(std::any_of(texts.begin(), texts.end(),
                                 [&](const std::string& t) { return std::regex_match(t, wanted); }))
-            << pattern << "\nreported:\n" << ::testing::PrintToString(texts);
+            << pattern << "\nreported:\n"
+            << ::testing::PrintToString(texts);
     }
     /// Expects `expected` at `level` exactly once, from the pipeline's own source.
     void expect_pipeline_report(Port_MsgLevel level, const std::string& expected) {
@@ -206,8 +207,8 @@ TEST_F(PipelineTest, InputFilesThatCannotBeLoadedLeaveWhatWasLoaded) {
     ScratchDir::write_file(damaged, bytes);
     capture.clear();
     EXPECT_EQ(vrx.hxb_read(damaged.c_str()), VX_FILE_ERROR);  // refused by the database
-    expect_failure_reported(literal("cannot read database file '" + damaged +
-                                    "': corrupt (checksum mismatch)\n"));
+    expect_failure_reported(
+        literal("cannot read database file '" + damaged + "': corrupt (checksum mismatch)\n"));
 
     EXPECT_EQ(vrx.get_design(), design);
     EXPECT_EQ(vrx.get_library(), nullptr);

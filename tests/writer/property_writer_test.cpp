@@ -50,7 +50,8 @@ TEST_F(PropertyWriterTest, ValuesOfEveryWrittenKind) {
     second.create_prop(HX_PROPERTY::make_text("P", HX_PROP_PARAM, "x y"), nullptr);
     second.create_prop("CREATE_TIMESTAMP", "t", 1);  // skipped only as an integer
     second.create_prop("F", HX_PROP_FLAG);
-    EXPECT_EQ(props(second), " (MAXDELAY=2:5ns SETUP=: TIMESPEC=\"TS a\" P=\"@x y\" CREATE_TIMESTAMP=t F");
+    EXPECT_EQ(props(second),
+              " (MAXDELAY=2:5ns SETUP=: TIMESPEC=\"TS a\" P=\"@x y\" CREATE_TIMESTAMP=t F");
     EXPECT_EQ(props(second, 1),
               " MAXDELAY=2:5ns SETUP=: TIMESPEC=\"TS a\" P=\"@x y\" CREATE_TIMESTAMP=t F");
     EXPECT_TRUE(capture.messages().empty());

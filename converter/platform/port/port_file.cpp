@@ -297,8 +297,9 @@ bool copy_in_kernel(int in, int out, bool& handled) {
         if (errno == EINTR) continue;
         // Not supported here (another file system, an old kernel): only an
         // error once bytes have moved.
-        if (!handled && (errno == EXDEV || errno == ENOSYS || errno == EOPNOTSUPP ||
-                         errno == EINVAL)) return false;
+        if (!handled &&
+            (errno == EXDEV || errno == ENOSYS || errno == EOPNOTSUPP || errno == EINVAL))
+            return false;
         handled = true;
         return false;
     }
