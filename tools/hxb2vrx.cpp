@@ -5,7 +5,8 @@
 // Progress and faults are reported through the message manager's default
 // sink: status lines on standard output, everything else on standard error.
 // The exit status is the VX_STATUS of the first step that failed, 0 when
-// both succeeded, or 64 for a usage error.
+// both succeeded, 2 after a fatal report (which ends the run), or 64 for a
+// usage error.
 #include <cstdint>
 
 #include "tool_args.h"
@@ -37,6 +38,7 @@ constexpr vrx_tool::ToolInfo kInfo = {
     "Exit status:\n"
     "  0   success\n"
     "  1   a file could not be opened, read or written, or the filter file is bad\n"
+    "  2   a fatal error: the input holds a value that the text format cannot carry\n"
     "  64  usage error\n",
     2,
     2,

@@ -294,6 +294,24 @@ TEST_F(Hxb2vrxTest, FailedStepExits1AndLeavesNoFileBehind) {
     EXPECT_TRUE(tmp_.entries().empty());
 }
 
+TEST_F(Hxb2vrxTest, FatalErrorEndsTheRunWithoutOutputOrTemporaryFile) {
+    HX_LIBRARY* library = hx_env.create_library("work", 0);
+    HX_DESIGN* design = library->create_design("top");
+    HX_LOGBLOCK* root = design->create_logblock(nullptr, 1, "top");
+    root->get_pin(0)->set_name("a");
+    root->get_pin(0)->set_dir(9);  // no direction keyword stands for this
+    const std::string input = save("bad.hxb", library,
+                                   [&](UT_PTRFILE* f) { return hx_env.write_design(f, design); });
+    const std::string output = dir_.file("bad.vrx");
+    ScratchDir::write_file(output, "previous contents");
+
+    const ToolRun r = run({input, output});
+    EXPECT_EQ(r.status, 2);
+    EXPECT_EQ(r.err, "FATAL_ERROR:Quorra - cannot find pin type name for pin 'a'\n");
+    EXPECT_EQ(ScratchDir::read_file(output), "previous contents");
+    EXPECT_TRUE(tmp_.entries().empty());
+}
+
 TEST_F(Hxb2vrxTest, LibraryFileWritesEveryDesign) {
     const std::string input = write_library_file();
     const std::string output = dir_.file("cells.vrx");
