@@ -300,8 +300,8 @@ TEST_F(Hxb2vrxTest, FatalErrorEndsTheRunWithoutOutputOrTemporaryFile) {
     HX_LOGBLOCK* root = design->create_logblock(nullptr, 1, "top");
     root->get_pin(0)->set_name("a");
     root->get_pin(0)->set_dir(9);  // no direction keyword stands for this
-    const std::string input = save("bad.hxb", library,
-                                   [&](UT_PTRFILE* f) { return hx_env.write_design(f, design); });
+    const std::string input =
+        save("bad.hxb", library, [&](UT_PTRFILE* f) { return hx_env.write_design(f, design); });
     const std::string output = dir_.file("bad.vrx");
     ScratchDir::write_file(output, "previous contents");
 
