@@ -9,6 +9,7 @@
 #include "hx_file.h"
 #include "hx_library.h"
 #include "port_msg.h"
+#include "sealed_file.h"
 
 namespace {
 
@@ -48,25 +49,13 @@ void read(const void* data, size_t size) {
     check_round_trip(*library, kind);
 }
 
-/// The bytes with the header's length and checksum fields made to fit.
-std::string sealed(const uint8_t* data, size_t size) {
-    std::string bytes(reinterpret_cast<const char*>(data), size);
-    const uint64_t body = size - HX_FILE_IO::kHeaderSize;
-    for (int i = 0; i < 8; ++i)
-        bytes[16 + i] = static_cast<char>(body >> (8 * i));
-    const uint32_t crc = HX_FILE_IO::checksum(bytes.data() + 12, size - 12);
-    for (int i = 0; i < 4; ++i)
-        bytes[8 + i] = static_cast<char>(crc >> (8 * i));
-    return bytes;
-}
-
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     silence_messages();
     read(data, size);
     if (size >= HX_FILE_IO::kHeaderSize) {
-        const std::string bytes = sealed(data, size);
+        const std::string bytes = sealed_file(data, size);
         read(bytes.data(), bytes.size());
     }
     return 0;
