@@ -8,6 +8,7 @@
 #include <random>
 
 #include "hx_library.h"
+#include "port_msg.h"
 #include "vrx.h"
 
 inline constexpr uint32_t kGates = 1'000'000;
@@ -32,4 +33,13 @@ inline HX_DESIGN* build_and_design(HX_LIBRARY& library, uint32_t gates) {
         }
     }
     return design;
+}
+
+/// Keeps a benchmark's own output clean of status messages: only errors and
+/// worse reach standard error.
+inline void show_only_errors() {
+    Port_MsgDispatcher::set_sink(
+        [](Port_MsgLevel level, const Port_MsgLocation&, std::string_view text) {
+            if (level >= PORT_MSG_ERROR) std::fwrite(text.data(), 1, text.size(), stderr);
+        });
 }

@@ -165,11 +165,7 @@ BENCHMARK(BM_ReadDesignFile)->Unit(benchmark::kMillisecond)->Iterations(3);
 }  // namespace
 
 int main(int argc, char** argv) {
-    // Keep the benchmark's own output clean of database status messages.
-    Port_MsgDispatcher::set_sink(
-        [](Port_MsgLevel level, const Port_MsgLocation&, std::string_view text) {
-            if (level >= PORT_MSG_ERROR) std::fwrite(text.data(), 1, text.size(), stderr);
-        });
+    show_only_errors();
     benchmark::Initialize(&argc, argv);
     benchmark::RunSpecifiedBenchmarks();
     benchmark::Shutdown();
