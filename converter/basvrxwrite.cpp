@@ -40,12 +40,17 @@ void track_temp(const char* name) {
     pending_temp = name;
 }
 
+// Removes the temporary file and stops tracking it; false when it stays.
+bool remove_temp(const char* temp_name) {
+    pending_temp.clear();
+    return Port::File::remove(temp_name);
+}
+
 // Closes the stream, removes the temporary file, forgets both.
 void discard_output(Port::Stream*& stream, const char* temp_name) {
     delete stream;  // closes without reporting
     stream = nullptr;
-    Port::File::remove(temp_name);
-    pending_temp.clear();
+    remove_temp(temp_name);
 }
 
 }  // namespace
@@ -165,21 +170,18 @@ VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
         discard_output(out_stream, temp_name);
         return VX_FILE_ERROR;
     }
-    delete out_stream;
-    out_stream = nullptr;
     if (!Port::File::copy(temp_name, path)) {
         write_msg(__LINE__).issueError("Unable to copy temporary file '%s' to '%s'.\n", temp_name,
                                        path);
-        Port::File::remove(temp_name);
-        pending_temp.clear();
+        discard_output(out_stream, temp_name);
         return VX_FILE_ERROR;
     }
-    if (!Port::File::remove(temp_name)) {
+    delete out_stream;
+    out_stream = nullptr;
+    if (!remove_temp(temp_name)) {
         write_msg(__LINE__).issueError("Unable to remove temporary file '%s'.\n", temp_name);
-        pending_temp.clear();
         return VX_FILE_ERROR;
     }
-    pending_temp.clear();
     return VX_OK;
 }
 

@@ -12,6 +12,7 @@
 
 #include <climits>
 #include <cstdint>
+#include <optional>
 #include <string_view>
 
 #include "hx_design.h"
@@ -159,6 +160,7 @@ class VRX {
     void write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count);
     void write_prim_header(HX_PRIMITIVE* prim, uint8_t physical, uint8_t no_props);
     void write_user_flag(const HX_BLOCK* block);
+    VX_LEGALNAME root_clash_label(const HX_BLOCK* block, const char* plain);
 
     // Pins.
     void write_root_pins(HX_BLOCK* block);
@@ -174,7 +176,9 @@ class VRX {
     void write_signal_props(HX_BLOCK* block);
     void write_map_signals(HX_BASEPHYSBLOCK* block);
     void write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_LEGALNAME& label);
-    void write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_LEGALNAME& label);
+    void write_unmapped_children(HX_BASEPHYSBLOCK* block, std::optional<VX_LEGALNAME>& label);
+    const VX_LEGALNAME& mapsignal_label(HX_BASEPHYSBLOCK* block,
+                                        std::optional<VX_LEGALNAME>& label);
 
     // Design traversal.
     void write_design();

@@ -37,7 +37,7 @@ void check_round_trip(const HX_LIBRARY& library, HX_FILE_TYPE kind) {
     if (again == nullptr || encode(*again, kind) != once) __builtin_trap();
 }
 
-void read(const void* data, size_t size) {
+void decode_and_check(const void* data, size_t size) {
     HX_FILE_TYPE kind = HX_FILE_IO::kind_of(data, size);
     if (kind == HX_FILE_UNKNOWN) kind = HX_FILE_DESIGN;
     std::string reason;
@@ -53,10 +53,6 @@ void read(const void* data, size_t size) {
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     silence_messages();
-    read(data, size);
-    if (size >= HX_FILE_IO::kHeaderSize) {
-        const std::string bytes = sealed_file(data, size);
-        read(bytes.data(), bytes.size());
-    }
+    read_raw_and_sealed(data, size, decode_and_check);
     return 0;
 }

@@ -20,3 +20,13 @@ inline std::string sealed_file(const uint8_t* data, size_t size) {
         bytes[8 + i] = static_cast<char>(crc >> (8 * i));
     return bytes;
 }
+
+/// Hands the bytes to `read` as they are, then sealed when they hold a header.
+template <class Read>
+void read_raw_and_sealed(const uint8_t* data, size_t size, Read&& read) {
+    read(data, size);
+    if (size >= HX_FILE_IO::kHeaderSize) {
+        const std::string bytes = sealed_file(data, size);
+        read(bytes.data(), bytes.size());
+    }
+}

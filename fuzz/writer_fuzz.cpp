@@ -50,7 +50,7 @@ void quiet_and_alive() {
     (void)done;
 }
 
-void write(const void* data, size_t size) {
+void decode_and_write(const void* data, size_t size) {
     HX_FILE_TYPE kind = HX_FILE_IO::kind_of(data, size);
     if (kind == HX_FILE_UNKNOWN) kind = HX_FILE_DESIGN;
     std::string reason;
@@ -64,10 +64,6 @@ void write(const void* data, size_t size) {
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     quiet_and_alive();
-    write(data, size);
-    if (size >= HX_FILE_IO::kHeaderSize) {
-        const std::string bytes = sealed_file(data, size);
-        write(bytes.data(), bytes.size());
-    }
+    read_raw_and_sealed(data, size, decode_and_write);
     return 0;
 }

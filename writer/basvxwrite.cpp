@@ -11,6 +11,7 @@
 #include <algorithm>
 #include <charconv>
 #include <cstring>
+#include <optional>
 
 #include "hx_design.h"
 #include "hx_library.h"
@@ -90,6 +91,17 @@ void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
     block->delete_child_iter(iter);
 }
 
+bool sits_in_root(const HX_BLOCK* block) {
+    const HX_BLOCK* parent = block->get_parent();
+    return parent != nullptr && parent->get_parent() == nullptr;
+}
+
+// A block directly in a root and named like that root would be taken for the
+// root itself where its label names it.
+bool named_like_its_root(const HX_BLOCK* block, const char* plain) {
+    return sits_in_root(block) && UT_STR::Compare(plain, block->get_parent()->get_name()) == 0;
+}
+
 }  // namespace
 
 // --- type names and headers -------------------------------------------------------
@@ -136,6 +148,14 @@ void VRX::write_object_header(const char* keyword, const HX_OBJECT* object, cons
     if (opened) write_item(")");
 }
 
+// "OBJ_$<identity>_<name>": the label of a block named like its root.
+VX_LEGALNAME VRX::root_clash_label(const HX_BLOCK* block, const char* plain) {
+    std::string text;
+    vx_append_invented(text, block);
+    (text += '_') += plain;
+    return vrx_legal(text.c_str(), block).keep();
+}
+
 void VRX::write_user_flag(const HX_BLOCK* block) {
     if (!omit_user && !block->is_physical() && block->get_user()) write_item(" USER");
 }
@@ -143,27 +163,17 @@ void VRX::write_user_flag(const HX_BLOCK* block) {
 void VRX::write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count) {
     const char* plain = block->get_name();
     const char* hier = build_hiername(block);
-    const HX_BLOCK* parent = block->get_parent();
     VX_LEGALNAME label;
-    if (vx_present(plain) && vx_present(hier)) {
-        if (root) {
-            label = vrx_legal(plain, block);
-        } else if (parent != nullptr && parent->get_parent() == nullptr) {
-            // A child named like the root would be taken for the root itself.
-            if (UT_STR::Compare(plain, parent->get_name()) == 0) {
-                std::string text;
-                vx_append_invented(text, block);
-                (text += '_') += plain;
-                label = vrx_legal(text.c_str(), block).keep();
-            } else {
-                label = vrx_legal(hier, block).keep();
-            }
-        } else {
-            label = block->isempty() ? vrx_legal(plain, block) : vrx_legal(hier, block).keep();
-        }
-    } else {
+    if (!vx_present(plain) || !vx_present(hier))
         label = vrx_legal(nullptr, block);
-    }
+    else if (root)
+        label = vrx_legal(plain, block);
+    else if (named_like_its_root(block, plain))
+        label = root_clash_label(block, plain);
+    else if (sits_in_root(block) || !block->isempty())
+        label = vrx_legal(hier, block).keep();
+    else
+        label = vrx_legal(plain, block);
     write_indent(2, block->is_physical() ? "PHYSBLOCK" : "BLOCK", label.view());
     char digits[16];
     if (root || pin_count) write_item(number_text(digits, block->get_pin_count()));
@@ -323,20 +333,19 @@ void VRX::write_signal_props(HX_BLOCK* block) {
 void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
     for_each_child(
         block, [&](HX_BLOCK* child) { write_map_signals(static_cast<HX_BASEPHYSBLOCK*>(child)); });
-    VX_LEGALNAME label;
-    bool labelled = false;
-    auto label_of_block = [&]() -> const VX_LEGALNAME& {
-        if (!labelled) {
-            label = vrx_legal(build_hiername(block), block).keep();
-            labelled = true;
-        }
-        return label;
-    };
+    std::optional<VX_LEGALNAME> label;  // made when a statement needs it
     for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
         const HX_PIN* pin = block->get_pin(i);
-        if (pin->get_map_signal() != nullptr) write_pin_mapsignal(block, pin, label_of_block());
+        if (pin->get_map_signal() != nullptr)
+            write_pin_mapsignal(block, pin, mapsignal_label(block, label));
     }
-    write_unmapped_children(block, label_of_block());
+    write_unmapped_children(block, label);
+}
+
+const VX_LEGALNAME& VRX::mapsignal_label(HX_BASEPHYSBLOCK* block,
+                                         std::optional<VX_LEGALNAME>& label) {
+    if (!label) label = vrx_legal(build_hiername(block), block).keep();
+    return *label;
 }
 
 void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin,
@@ -365,7 +374,7 @@ void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin,
 
 // Logical blocks placed in this physical block without a map signal: one
 // MAPSIGNAL statement without pin names them all.
-void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_LEGALNAME& label) {
+void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, std::optional<VX_LEGALNAME>& label) {
     UT_BLIST_ITER<HX_BLOCK>* children = block->create_log_child_iter();
     bool opened = false;
     while (HX_BLOCK* child = children->l_next()) {
@@ -374,7 +383,7 @@ void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, const VX_LEGALNAME& l
             mapped = child->get_pin(i)->get_map_signal() != nullptr;
         if (mapped) continue;
         if (!opened) {
-            write_indent(2, "MAPSIGNAL", label.view());
+            write_indent(2, "MAPSIGNAL", mapsignal_label(block, label).view());
             begin_construct();
             opened = true;
         }
@@ -406,20 +415,12 @@ void VRX::traverse(HX_BLOCK* block, uint8_t physical) {
 
     const char* plain = block->get_name();
     const char* hier = build_hiername(block);
-    const HX_BLOCK* parent = block->get_parent();
     VX_LEGALNAME design_name;
     VX_LEGALNAME block_name;
     if (vx_present(plain) && vx_present(hier)) {
         block_name = vrx_legal(hier, block).keep();
-        if (parent != nullptr && parent->get_parent() == nullptr &&
-            UT_STR::Compare(plain, parent->get_name()) == 0) {
-            std::string text;
-            vx_append_invented(text, block);
-            (text += '_') += plain;
-            design_name = vrx_legal(text.c_str(), block).keep();
-        } else {
-            design_name = block_name;
-        }
+        design_name =
+            named_like_its_root(block, plain) ? root_clash_label(block, plain) : block_name;
     } else {
         design_name = vrx_legal(nullptr, block);
         block_name = design_name;

@@ -282,26 +282,25 @@ bool File::close(UT_PTRFILE* file) {
 
 namespace {
 
+enum class KernelCopy { done, failed, unsupported };
+
 // Copies in the kernel where it can (no trip through user memory; a clone of
-// the extents on file systems that share them). False with `handled` clear
-// when the kernel cannot copy these files at all, so the caller falls back.
-bool copy_in_kernel(int in, int out, bool& handled) {
-    handled = false;
+// the extents on file systems that share them). `unsupported` when the
+// kernel cannot copy these files at all (another file system, an old
+// kernel) before any byte moved, so the caller falls back.
+KernelCopy copy_in_kernel(int in, int out) {
+    bool moved = false;
     for (;;) {
         const ssize_t n = ::copy_file_range(in, nullptr, out, nullptr, kCopyChunk * 64, 0);
-        if (n == 0) return true;
+        if (n == 0) return KernelCopy::done;
         if (n > 0) {
-            handled = true;
+            moved = true;
             continue;
         }
         if (errno == EINTR) continue;
-        // Not supported here (another file system, an old kernel): only an
-        // error once bytes have moved.
-        if (!handled &&
-            (errno == EXDEV || errno == ENOSYS || errno == EOPNOTSUPP || errno == EINVAL))
-            return false;
-        handled = true;
-        return false;
+        const bool unsupported =
+            errno == EXDEV || errno == ENOSYS || errno == EOPNOTSUPP || errno == EINVAL;
+        return unsupported && !moved ? KernelCopy::unsupported : KernelCopy::failed;
     }
 }
 
@@ -324,9 +323,9 @@ bool File::copy(const char* from, const char* to) {
     ReplaceFile out;
     bool ok = out.create(to);
     if (ok) {
-        bool handled = false;
-        ok = copy_in_kernel(in, out.fd(), handled);
-        if (!ok && !handled) ok = copy_through_buffer(in, out.fd());
+        const KernelCopy copied = copy_in_kernel(in, out.fd());
+        ok = copied == KernelCopy::unsupported ? copy_through_buffer(in, out.fd())
+                                               : copied == KernelCopy::done;
     }
     ::close(in);
     return ok && out.commit();

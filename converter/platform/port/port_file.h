@@ -65,25 +65,26 @@ class Stream {
     // moves saves a library call each. Only bytes of [from, from + count)
     // are read and only [to, to + count) written.
     static void copy_bytes(char* to, const char* from, std::size_t count) {
-        if (count > 16) {
+        if (count > 16)
             std::memcpy(to, from, count);
-        } else if (count >= 8) {
-            char head[8], tail[8];
-            std::memcpy(head, from, 8);
-            std::memcpy(tail, from + count - 8, 8);
-            std::memcpy(to, head, 8);
-            std::memcpy(to + count - 8, tail, 8);
-        } else if (count >= 4) {
-            char head[4], tail[4];
-            std::memcpy(head, from, 4);
-            std::memcpy(tail, from + count - 4, 4);
-            std::memcpy(to, head, 4);
-            std::memcpy(to + count - 4, tail, 4);
-        } else if (count > 0) {
+        else if (count >= 8)
+            copy_ends<8>(to, from, count);
+        else if (count >= 4)
+            copy_ends<4>(to, from, count);
+        else if (count > 0) {
             to[0] = from[0];
             to[count / 2] = from[count / 2];
             to[count - 1] = from[count - 1];
         }
+    }
+    // The first and the last N bytes (overlapping), for N <= count <= 2 N.
+    template <std::size_t N>
+    static void copy_ends(char* to, const char* from, std::size_t count) {
+        char head[N], tail[N];
+        std::memcpy(head, from, N);
+        std::memcpy(tail, from + count - N, N);
+        std::memcpy(to, head, N);
+        std::memcpy(to + count - N, tail, N);
     }
     bool write_through(const void* bytes, std::size_t count);
     void update_write_limit();
