@@ -6,39 +6,15 @@
 #include "port_msg.h"
 #include "ut_str.h"
 #include "vrx.h"
+#include "vx_builder_internal.h"
 
 VRX* active_vrx = nullptr;
 
 namespace {
 
-int compare_signal_name(const HX_SIGNAL* entry, const char* key) {
-    return UT_STR::Compare(entry->get_name(), key);
-}
-
 constexpr uint16_t kNoIndex = 0xFFFF;
 
 }  // namespace
-
-// --- VX_SIGNALCACHE ------------------------------------------------------------
-
-VX_SIGNALCACHE::VX_SIGNALCACHE() : UT_BTR_TREE<HX_SIGNAL>(compare_signal_name) {}
-
-// The entries are references into the design, which keeps the signals.
-VX_SIGNALCACHE::~VX_SIGNALCACHE() = default;
-
-HX_SIGNAL* VX_SIGNALCACHE::find_or_create(const char* name, uint8_t physical) {
-    HX_SIGNAL*& slot = add(name);
-    if (slot != nullptr || design == nullptr) return slot;
-    HX_BLOCK* root = physical ? static_cast<HX_BLOCK*>(design->get_phys_root())
-                              : static_cast<HX_BLOCK*>(design->get_log_root());
-    // Without a root there is nowhere to make it; the empty slot counts as absent.
-    if (root != nullptr) slot = design->create_signal(root, name);
-    return slot;
-}
-
-void VX_SIGNALCACHE::add_signal(HX_SIGNAL* signal) {
-    if (signal != nullptr) add(signal->get_name()) = signal;
-}
 
 // --- VRX -----------------------------------------------------------------------
 
@@ -64,7 +40,8 @@ VRX::VRX()
       library(nullptr),
       design(nullptr),
       log_root(nullptr),
-      phys_root(nullptr) {
+      phys_root(nullptr),
+      lookups(std::make_unique<VX_LOOKUPS>()) {
     if (active_vrx != nullptr) {
         Port_MsgManData::createObject("Quorra", "../s/basvrx", __LINE__, "$Revision: 1.2 $")
             .issueFatal(2, "multiple concurrent VX objects\n");
@@ -80,7 +57,10 @@ VRX::~VRX() {
     release_owned();
 }
 
-VRX::VRX(const VRX& other) : log_signals(other.log_signals), phys_signals(other.phys_signals) {
+VRX::VRX(const VRX& other)
+    : log_signals(other.log_signals),
+      phys_signals(other.phys_signals),
+      lookups(std::make_unique<VX_LOOKUPS>()) {
     copy_from(other);
 }
 
@@ -129,10 +109,6 @@ void VRX::copy_from(const VRX& other) {
     design = other.design;
     log_root = other.log_root;
     phys_root = other.phys_root;
-}
-
-void VRX::init_curr_indices(uint16_t value) {
-    std::fill(std::begin(curr_indices), std::end(curr_indices), value);
 }
 
 void VRX::set_parser_status(VX_PARSER_STATUS status) {

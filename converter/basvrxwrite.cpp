@@ -18,6 +18,7 @@
 #include "ut_str.h"
 #include "ut_timestamp.h"
 #include "vrx.h"
+#include "vx_builder_internal.h"
 #include "vx_write_internal.h"
 
 namespace {
@@ -62,6 +63,7 @@ VX_STATUS VRX::hxb_read(const char* path) {
         write_msg(__LINE__).issueError("cannot open input file '%s'\n", "");
         return VX_FILE_ERROR;
     }
+    lookups = std::make_unique<VX_LOOKUPS>();  // what a text read left behind
     delete db_file;
     db_file = new UT_PTRFILE(Port::ACCESS_READ);
     if (Port::File::open(path, db_file, true) == nullptr) {

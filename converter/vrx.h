@@ -12,6 +12,7 @@
 
 #include <climits>
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string_view>
 
@@ -20,12 +21,14 @@
 #include "pm_device.h"
 #include "port_file.h"
 #include "ut_btr_tree.h"
+#include "ut_darray.h"
 #include "ut_ptrfile.h"
 #include "vrx_parser.h"
 #include "vx_legalname.h"
 
 class Hxb_PropFilter;
 class HX_PROPERTY;
+struct VX_LOOKUPS;
 
 /// Result of the public conversion operations.
 enum VX_STATUS : int32_t {
@@ -83,6 +86,28 @@ class VRX {
     /// every failure leaves it untouched and removes the temporary file.
     VX_STATUS vrx_write(const char* path, const char* filter_file, uint8_t omit_user);
 
+    // --- Text to database -----------------------------------------------------
+
+    /// Reads the text netlists `names`, in order, into a new library named
+    /// after the first name. A name without an extension is read with ".vrx"
+    /// added. With `is_design` set the result is the last design the text
+    /// defines, else the whole library; `make_physroot` derives a physical
+    /// root for designs whose logical root carries PHYSICAL; `nograft` (for
+    /// libraries only) keeps designs from being grafted into each other.
+    /// Reading stops at the first file that fails to open (VX_FILE_ERROR) or
+    /// to parse (VX_PARSE_ERROR); after the last file the design-rule check
+    /// runs, and VX_DRC_ERROR means it found errors in a complete result.
+    VX_STATUS vrx_read(const DARRAY_NAME& names, uint8_t is_design, uint8_t make_physroot,
+                       uint8_t nograft);
+    /// The same for one file.
+    VX_STATUS vrx_read(const char* name, uint8_t is_design, uint8_t make_physroot,
+                       uint8_t nograft);
+    /// Stores what vrx_read built, the last design (.hxb) or the library
+    /// (.hxl), as a database file. A null `path` names the file after the
+    /// first input of vrx_read; the extension is set to fit what is written.
+    /// `path` is replaced only by a complete file; VX_FILE_ERROR otherwise.
+    VX_STATUS hxb_write(const char* path);
+
   private:
     friend void vrx_do_library_props(VX_PROP_ARRAY*);
     friend void vrx_begin_design(const char*, VX_PROP_ARRAY*);
@@ -104,6 +129,10 @@ class VRX {
     void init_curr_indices(uint16_t value);
     void set_parser_status(VX_PARSER_STATUS status);
 
+    // Text to database: one input file, and the design-rule check.
+    VX_STATUS read_one_file(const char* name);
+    bool check();
+
     // Builder operations, one per kind of statement of a text netlist.
     void do_library_props(VX_PROP_ARRAY* props);
     void begin_design(const char* name, VX_PROP_ARRAY* props);
@@ -116,6 +145,45 @@ class VRX {
     void do_signal(const char* name, VX_SIGNAL_TYPE kind, VX_PROP_ARRAY* props);
     void do_mapsignal(const char* block, const char* pin, VX_PROP_ARRAY* props);
     void add_mapconn(const char* block, const char* pin, VX_PROP_ARRAY* props);
+
+    // Property rules on reading.
+    template <class Named>
+    bool assign_name(Named* object, const VX_PROP& prop);
+    void assign_hxb_prop(HX_OBJECT* object, const VX_PROP& prop, uint8_t on_pin);
+    void do_design_props(HX_DESIGN* target, VX_PROP_ARRAY* props);
+    void do_block_props(HX_BLOCK* block, VX_PROP_ARRAY* props);
+    bool do_physical_flag(HX_BLOCK* block);
+    void do_mapsignal_props(HX_MAPSIGNAL* map, VX_PROP_ARRAY* props);
+
+    // Blocks, primitives and pins.
+    void begin_root_block(const char* label, uint16_t width, VX_PROP_ARRAY* props);
+    HX_DESIGN* graft_source(const char* label);
+    void begin_template_block(const char* label, uint16_t width, VX_PROP_ARRAY* props);
+    void begin_grafted_block(HX_DESIGN* source, VX_PROP_ARRAY* props);
+    HX_PIN* do_graft_pin(const char* name, VX_PROP_ARRAY* props);
+    HX_PIN* do_prim_pin(HX_PRIMITIVE* prim, const char* name, VX_PROP_ARRAY* props);
+    HX_PIN* do_plain_pin(const char* name, VX_PROP_ARRAY* props);
+    bool adopt_existing_root(const char* label);
+    void name_unnamed_pins();
+    void parse_pending_pinrefs();
+    HX_PHYSBLOCK* create_physroot(HX_BASELOGBLOCK* log_block);
+    void reset_physpins();
+    void add_physpin(const char* name, HX_PIN_TYPE direction);
+
+    // Pin properties.
+    void do_pin_props(HX_BLOCK* block, uint16_t index, VX_PROP_ARRAY* props);
+    void do_primpin_props(HX_PRIMITIVE* prim, uint16_t index, VX_PROP_ARRAY* props);
+    bool assign_signal(HX_BLOCK* block, uint16_t index, const VX_PROP& prop);
+    void set_pin_type(HX_PIN* pin, const char* value);
+
+    // Signals, map signals and merge records.
+    void do_signal_props(HX_SIGNAL* signal, VX_PROP_ARRAY* props, uint8_t physical_kind);
+    HX_NETWORK* find_net_by_name(const char* name, VX_SIGNAL_TYPE kind);
+    void make_global(HX_SIGNAL*& signal, uint8_t physical_kind);
+    void do_merge_prop(HX_SIGNAL* signal, const char* name, const char* value);
+    HX_BLOCK* get_blk(HX_DESIGN* target, const char* name, uint8_t physical_kind);
+    void resolve_merge_props();
+    void resolve_design_merges(HX_DESIGN* target);
 
     // Database to text: the top of the file and the library.
     void write_file_header();
@@ -216,6 +284,9 @@ class VRX {
     HX_DESIGN* design;
     HX_BASELOGBLOCK* log_root;
     HX_BASEPHYSBLOCK* phys_root;
+    // Keyed lookups of the builder (blocks and networks by name, designs
+    // holding merge records); made on first use, never copied.
+    std::unique_ptr<VX_LOOKUPS> lookups;
 };
 
 /// The converter that the text reader's callbacks reach; null when none.

@@ -7,6 +7,7 @@
 #include <string_view>
 
 #include "port_msg.h"
+#include "vx_text.h"
 
 /// Message object of the writer's own reports.
 inline Port_MsgManData vx_write_msg(int line) {
@@ -30,11 +31,3 @@ inline uint32_t vx_identity(const void* object) {
 void vx_append_invented(std::string& out, const void* object);
 /// Appends a signed decimal number.
 void vx_append_int(std::string& out, long long value);
-
-/// Never null: texts that the database may leave absent.
-inline const char* vx_text(const char* s) {
-    return s != nullptr ? s : "";
-}
-inline bool vx_present(const char* s) {
-    return s != nullptr && *s != '\0';
-}

@@ -336,6 +336,8 @@ class HX_SIGNAL::CONN_ITER : public HX_CONN_LIST_ITER {
 class HX_NETWORK : public HX_OBJECT {
   public:
     uint32_t get_tag() const { return tag_; }
+    /// Its place in the design's network order (HX_DESIGN::network_at).
+    uint32_t get_slot() const { return slot_; }
     /// The member nearest the root; a global signal is highest of all.
     HX_SIGNAL* get_highest_signal() const { return highest_; }
     uint32_t get_member_count() const { return members_; }
@@ -476,6 +478,18 @@ class HX_DESIGN : public HX_OBJECT {
 
     HX_NETWORK* find_net_tag(uint32_t tag) const;
     size_t block_count() const { return blocks_.size(); }
+    /// The block made `position`-th (0 first), or null past the last.
+    HX_BLOCK* block_at(size_t position) const {
+        return position < blocks_.size() ? blocks_[position] : nullptr;
+    }
+    /// Positions in the network order: network_at(p) for p below
+    /// network_slots() is the network at that place, or null where a network
+    /// was joined away. A network keeps its place until it is joined away;
+    /// new networks take places after the last.
+    size_t network_slots() const { return networks_.size(); }
+    HX_NETWORK* network_at(size_t slot) const {
+        return slot < networks_.size() ? networks_[slot] : nullptr;
+    }
     size_t network_count() const { return network_count_; }
     size_t global_count() const { return globals_.size(); }
 
