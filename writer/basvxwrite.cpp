@@ -354,6 +354,12 @@ void VRX::write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin,
     write_indent(2, "MAPSIGNAL", label.view());
     write_pair(" ", vrx_legal(pin->get_name(), pin).view());
     uint8_t opened = 0;
+    // The map signal's own name, which the reader takes from NAME; without
+    // it a named map signal would come back unnamed.
+    if (vx_present(map->get_name())) {
+        write_entry(" (NAME=", vrx_legal(map->get_name(), map).view(), false);
+        opened = 1;
+    }
     write_prop_list(map, &opened, nullptr);
     if (opened) write_item(")");
     begin_construct();

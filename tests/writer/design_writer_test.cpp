@@ -358,10 +358,10 @@ DESIGN d {
       PIN OUT (NAME=OUT)
    }
    PHYSSIGNAL ps (W=1)
-   MAPSIGNAL ptop/pb/pc x {
+   MAPSIGNAL ptop/pb/pc x (NAME=m3) {
       MAPCONN top/l4 d
    }
-   MAPSIGNAL ptop/pb p0 (MP=1) {
+   MAPSIGNAL ptop/pb p0 (NAME=m1 MP=1) {
       MAPCONN top/l1 a
       MAPCONN top/l2 c (MAPINV)
    }
