@@ -76,15 +76,22 @@ void VRX::add_alias(const char* name, const char* alias) {
 
 // --- Blocks ------------------------------------------------------------------------
 
-void VRX::begin_block(const char* label, uint16_t width, uint8_t physical_stmt,
-                      VX_PROP_ARRAY* props) {
+// What every block and primitive statement starts with; false when there is
+// no design to build into.
+bool VRX::start_block_statement(uint8_t physical_stmt) {
     physical = physical_stmt;
     grafting = 0;
     curr_block = nullptr;
     init_curr_indices(0);
+    if (design == nullptr) return false;
+    lookups->nets.invalidate();  // the statement may join or rename networks
+    return true;
+}
+
+void VRX::begin_block(const char* label, uint16_t width, uint8_t physical_stmt,
+                      VX_PROP_ARRAY* props) {
     pending_pinrefs = 0;
-    if (design == nullptr) return;
-    lookups->nets.invalidate();
+    if (!start_block_statement(physical_stmt)) return;
     if (physical ? phys_root == nullptr : log_root == nullptr) {
         begin_root_block(label, width, props);
         return;
@@ -208,12 +215,7 @@ void VRX::begin_grafted_block(HX_DESIGN* source, VX_PROP_ARRAY* props) {
 
 void VRX::begin_prim(const char* type, uint16_t width, uint8_t physical_stmt,
                      VX_PROP_ARRAY* props) {
-    physical = physical_stmt;
-    grafting = 0;
-    curr_block = nullptr;
-    init_curr_indices(0);
-    if (design == nullptr) return;
-    lookups->nets.invalidate();
+    if (!start_block_statement(physical_stmt)) return;
     const VX_PRIM_TYPE_ROW* row = vx_find_prim_type(type);
     if (row == nullptr) {
         vx_error("Unknown primitive type specified: %s", type);

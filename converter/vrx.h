@@ -156,6 +156,7 @@ class VRX {
     void do_mapsignal_props(HX_MAPSIGNAL* map, VX_PROP_ARRAY* props);
 
     // Blocks, primitives and pins.
+    bool start_block_statement(uint8_t physical_stmt);
     void begin_root_block(const char* label, uint16_t width, VX_PROP_ARRAY* props);
     HX_DESIGN* graft_source(const char* label);
     void begin_template_block(const char* label, uint16_t width, VX_PROP_ARRAY* props);

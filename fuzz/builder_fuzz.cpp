@@ -6,7 +6,6 @@
 // then stored as a database file in memory, read back, and written as text
 // to /dev/null, so that odd designs built from text also meet the file
 // format and the writer.
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <cstddef>
@@ -14,38 +13,14 @@
 #include <cstdio>
 #include <string>
 
+#include "fuzz_host.h"
 #include "hx_file.h"
 #include "hx_library.h"
 #include "port_file.h"
 #include "port_msg.h"
 #include "vrx.h"
 
-struct VRX_TEST_ACCESS {
-    static void write_text(VRX& vrx) {
-        Port::Stream stream(Port::ACCESS_WRITE, 4096);
-        const int fd = ::open("/dev/null", O_WRONLY | O_CLOEXEC);
-        if (fd < 0) __builtin_trap();
-        stream.attach(fd, "/dev/null", true);
-        vrx.out_stream = &stream;
-        if (vrx.is_design)
-            vrx.write_design();
-        else
-            vrx.write_library();
-        vrx.out_stream = nullptr;
-    }
-};
-
 namespace {
-
-void quiet_and_alive() {
-    static const bool done = [] {
-        Port_MsgDispatcher::set_sink(
-            [](Port_MsgLevel, const Port_MsgLocation&, std::string_view) {});
-        Port_MsgDispatcher::set_exit_handler([](int) {});
-        return true;
-    }();
-    (void)done;
-}
 
 const std::string& input_path() {
     static const std::string path =
@@ -80,13 +55,14 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         const VX_STATUS status =
             vrx.vrx_read(input_path().c_str(), flags & 1, (flags >> 1) & 1, (flags >> 2) & 1);
         library = vrx.get_library();
-        if (status == VX_OK || status == VX_DRC_ERROR) {
-            if ((flags & 1) && vrx.get_design() != nullptr)
-                round_trip_file(*vrx.get_design(), HX_FILE_DESIGN);
-            else if (!(flags & 1) && library != nullptr)
+        HX_DESIGN* design = (flags & 1) ? vrx.get_design() : nullptr;
+        const bool built = (flags & 1) ? design != nullptr : library != nullptr;
+        if ((status == VX_OK || status == VX_DRC_ERROR) && built) {
+            if (design != nullptr)
+                round_trip_file(*design, HX_FILE_DESIGN);
+            else
                 round_trip_file(*library, HX_FILE_LIBRARY);
-            if (((flags & 1) ? static_cast<void*>(vrx.get_design()) : library) != nullptr)
-                VRX_TEST_ACCESS::write_text(vrx);
+            VRX_TEST_ACCESS::write_to_null(vrx, design, library);
         }
     }
     if (library != nullptr) hx_env.delete_library(library);
