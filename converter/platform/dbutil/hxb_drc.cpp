@@ -2,6 +2,7 @@
 
 #include <string_view>
 #include <unordered_set>
+#include <vector>
 
 #include "hx_design.h"
 #include "hx_library.h"
@@ -101,6 +102,20 @@ struct NetTally {
     }
 };
 
+// What one network's pins add up to, enough to tell whether it is at fault.
+struct NetMark {
+    uint8_t drivers = 0;  // any driver, weak or strong
+    uint8_t loads = 0;
+    uint8_t strong = 0;  // strong drivers, counted up to 2
+
+    void add(Role role) {
+        if (role == Role::Load || role == Role::WeakDriverAndLoad) loads = 1;
+        if (role == Role::None || role == Role::Load) return;
+        drivers = 1;
+        if (role == Role::StrongDriver && strong < 2) ++strong;
+    }
+};
+
 // What `pin` does to the net of `signal`, which is on one of its two sides.
 Role role_at(const HX_PIN& pin, const HX_SIGNAL& signal) {
     const HX_BLOCK& block = *pin.get_block();
@@ -124,8 +139,8 @@ void tally_signal(const HX_SIGNAL& signal, NetTally& tally) {
 
 }  // namespace
 
-// One check of one design: a walk over the blocks' pins, then one over the
-// networks' members and their connections.
+// One check of one design: a walk over the blocks' pins, then the networks'
+// tallies (see walk_networks).
 class Hxb_DRC::Pass {
   public:
     Pass(Hxb_DRC& drc, const HX_DESIGN& design)
@@ -186,11 +201,43 @@ class Hxb_DRC::Pass {
         }
     }
 
+    // Pass one tallies every network from the pins' side: the blocks and
+    // their pin arrays lie in memory in order, so this is a near-sequential
+    // sweep with two bytes of state per network. Only the networks it finds
+    // at fault are walked member by member, for the texts of their reports.
     void walk_networks() {
-        UT_BLISTS_ITER<HX_NETWORK>* iter = design_.create_network_iter();
-        while (const HX_NETWORK* net = iter->l_next())
-            check_network(*net);
-        design_.delete_network_iter(iter);
+        std::vector<NetMark> marks(design_.network_slots());
+        UT_BLIST_ITER<HX_BLOCK>* blocks = design_.create_block_iter();
+        while (const HX_BLOCK* block = blocks->l_next())
+            mark_pins(*block, marks);
+        design_.delete_block_iter(blocks);
+        UT_BLIST_ITER<HX_SIGNAL>* globals = design_.create_global_iter();
+        while (const HX_SIGNAL* global = globals->l_next())
+            mark(marks, global, Role::WeakDriver);
+        design_.delete_global_iter(globals);
+        for (std::size_t slot = 0; slot < marks.size(); ++slot) {
+            const NetMark& m = marks[slot];
+            const bool undriven = m.loads && !m.drivers && on(CHECK_UNDRIVEN_NET);
+            const bool multiple = m.strong > 1 && on(CHECK_MULTIPLE_DRIVERS);
+            if (undriven || multiple) check_network(*design_.network_at(slot));
+        }
+    }
+
+    static void mark(std::vector<NetMark>& marks, const HX_SIGNAL* signal, Role role) {
+        if (signal == nullptr || role == Role::None || signal->get_network() == nullptr) return;
+        marks[signal->get_network()->get_slot()].add(role);
+    }
+
+    static void mark_pins(const HX_BLOCK& block, std::vector<NetMark>& marks) {
+        // A block with contents passes its nets through; only a black box ends them.
+        const bool ends_nets = block.is_primitive() || block.isempty();
+        const bool weak = drives_weakly(block);
+        const bool is_root = block.get_parent() == nullptr;
+        for (uint16_t i = 0; i < block.get_pin_count(); ++i) {
+            const HX_PIN& pin = *block.get_pin(i);
+            if (ends_nets) mark(marks, pin.get_outer_signal(), role_of(pin.get_dir(), weak));
+            if (is_root) mark(marks, pin.get_inner_signal(), root_role_of(pin.get_dir()));
+        }
     }
 
     void check_network(const HX_NETWORK& net) {

@@ -18,8 +18,9 @@
 // the undriven-network check, but never as a second driver. NOTYPE pins
 // neither drive nor load.
 //
-// Cost: one pass over the blocks' pins and one over the networks' members and
-// their connections: linear in the design's size.
+// Cost: two passes over the blocks' pins, with two bytes of state per
+// network, then a walk of the members and connections of the networks found
+// at fault only: linear in the design's size.
 #pragma once
 
 #include <cstdint>
