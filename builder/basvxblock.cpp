@@ -163,7 +163,12 @@ void VRX::begin_template_block(const char* label, uint16_t width, VX_PROP_ARRAY*
     HX_BLOCK* block =
         physical ? static_cast<HX_BLOCK*>(design->create_physblock(phys_root, width, label))
                  : design->create_logblock(log_root, width, label);
-    if (block == nullptr) return;  // the root is a primitive: it takes no children
+    if (block == nullptr) {
+        // The root is a primitive, which takes no children.
+        vx_error("Block %s cannot be placed in design %s: its root is a primitive", label,
+                 vx_text(design->get_name()));
+        return;
+    }
     curr_block = block;
     do_block_props(block, props);
 }
@@ -233,35 +238,39 @@ void VRX::begin_prim(const char* type, uint16_t width, uint8_t physical_stmt,
         vx_error("BLOCK type %s must have width 2 or greater", type);
         return;
     }
-    HX_BLOCK* root = physical ? static_cast<HX_BLOCK*>(phys_root) : log_root;
-    HX_BLOCK* prim = nullptr;
-    if (root != nullptr) {
-        prim = physical ? static_cast<HX_BLOCK*>(
-                              design->create_physprim(phys_root, row->value, width, nullptr))
-                        : design->create_logprim(log_root, row->value, width, nullptr);
-    } else if (!adopt_existing_root(type)) {
-        prim = physical ? static_cast<HX_BLOCK*>(
-                              design->create_physprim(nullptr, row->value, width, nullptr))
-                        : design->create_logprim(nullptr, row->value, width, nullptr);
-        if (prim != nullptr) {
-            if (physical)
-                phys_root = static_cast<HX_BASEPHYSBLOCK*>(prim);
-            else
-                log_root = static_cast<HX_BASELOGBLOCK*>(prim);
-            for (uint16_t i = 0; i < prim->get_pin_count(); ++i)
-                prim->get_pin(i)->create_prop("UNUSED", HX_PROP_FLAG);
-        }
-    } else {
-        return;
-    }
-    if (prim == nullptr) {
-        // The width gives more pins than a block can have, or the root is a
-        // primitive, which takes no children.
-        vx_error("cannot create primitive %s of width %u", type, unsigned(width));
-        return;
-    }
+    HX_BLOCK* prim = create_prim(type, row->value, width);
+    if (prim == nullptr) return;
     curr_block = prim;
     do_block_props(prim, props);
+}
+
+// A child of the root of the statement's kind, or that root itself when the
+// design has none yet; null after an error.
+HX_BLOCK* VRX::create_prim(const char* keyword, int32_t type, uint16_t width) {
+    HX_BLOCK* root = physical ? static_cast<HX_BLOCK*>(phys_root) : log_root;
+    if (root == nullptr && adopt_existing_root(keyword)) return nullptr;
+    if (root != nullptr && root->is_primitive()) {
+        vx_error("Primitive %s cannot be placed in design %s: its root is a primitive", keyword,
+                 vx_text(design->get_name()));
+        return nullptr;
+    }
+    HX_BLOCK* prim =
+        physical ? static_cast<HX_BLOCK*>(design->create_physprim(phys_root, type, width, nullptr))
+                 : design->create_logprim(log_root, type, width, nullptr);
+    if (prim == nullptr) {  // more pins than a block can have
+        vx_error("cannot create primitive %s of width %u", keyword, unsigned(width));
+        return nullptr;
+    }
+    if (root != nullptr) return prim;
+    if (physical)
+        phys_root = static_cast<HX_BASEPHYSBLOCK*>(prim);
+    else
+        log_root = static_cast<HX_BASELOGBLOCK*>(prim);
+    // A root primitive's pins are its design's ports; those that no PIN
+    // statement names stay unused.
+    for (uint16_t i = 0; i < prim->get_pin_count(); ++i)
+        prim->get_pin(i)->create_prop("UNUSED", HX_PROP_FLAG);
+    return prim;
 }
 
 // --- Pins --------------------------------------------------------------------------

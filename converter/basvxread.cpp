@@ -79,6 +79,7 @@ VX_STATUS VRX::vrx_read(const DARRAY_NAME& names, uint8_t design_flag, uint8_t p
     curr_mapsignal = nullptr;
     curr_mapparent = nullptr;
     lookups = std::make_unique<VX_LOOKUPS>();
+    reset_physpins();  // a read that stopped inside a design left its pins
     delete[] first_input;
     first_input = UT_STR::Dup(list.get()[0]);
 

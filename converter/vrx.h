@@ -159,6 +159,7 @@ class VRX {
     bool start_block_statement(uint8_t physical_stmt);
     void begin_root_block(const char* label, uint16_t width, VX_PROP_ARRAY* props);
     HX_DESIGN* graft_source(const char* label);
+    HX_BLOCK* create_prim(const char* keyword, int32_t type, uint16_t width);
     void begin_template_block(const char* label, uint16_t width, VX_PROP_ARRAY* props);
     void begin_grafted_block(HX_DESIGN* source, VX_PROP_ARRAY* props);
     HX_PIN* do_graft_pin(const char* name, VX_PROP_ARRAY* props);
