@@ -36,9 +36,12 @@ class Index {
         std::vector<HX_MAPSIGNAL*> maps;
     };
 
+    explicit Index(bool structural) : structural_(structural) {}
+
     void add_library(const HX_LIBRARY& library) { labels_[&library] = "library"; }
 
     void add_design(const HX_DESIGN& design, const std::string& prefix) {
+        if (structural_) return add_design_by_place(design, prefix);
         DesignIndex& d = designs_.emplace_back();
         d.design = &design;
         labels_[&design] = prefix + "design";
@@ -73,6 +76,88 @@ class Index {
     size_t design_count() const { return designs_.size(); }
 
   private:
+    /// Labels from places and names, each list in label order.
+    void add_design_by_place(const HX_DESIGN& design, const std::string& prefix) {
+        DesignIndex& d = designs_.emplace_back();
+        d.design = &design;
+        labels_[&design] = prefix + "design";
+        add_tree(d, design.get_log_root(), prefix + "logical root");
+        add_tree(d, design.get_phys_root(), prefix + "physical root");
+        auto* globals = design.create_global_iter();
+        label_named(drain<HX_SIGNAL>(globals), prefix + "global ", d.signals);
+        design.delete_global_iter(globals);
+        for (const HX_BLOCK* block : d.blocks) {
+            auto* iter = block->create_signal_iter();
+            label_named(drain<HX_SIGNAL>(iter), labels_[block] + " signal ", d.signals);
+            block->delete_signal_iter(iter);
+        }
+        auto* nets = design.create_network_iter();
+        for (HX_NETWORK* net : drain<HX_NETWORK>(nets))
+            labels_[net] = "network of " + first_member(*net);
+        design.delete_network_iter(nets);
+        auto* maps = design.create_mapsignal_iter();
+        for (HX_MAPSIGNAL* map : drain<HX_MAPSIGNAL>(maps)) {
+            labels_[map] = label(map->get_block()) + " map signal on pin " +
+                           std::to_string(map->get_pin_index());
+            d.maps.push_back(map);
+        }
+        design.delete_mapsignal_iter(maps);
+        nets = design.create_network_iter();
+        d.networks = drain<HX_NETWORK>(nets);
+        design.delete_network_iter(nets);
+        sort_by_label(d.networks);
+        sort_by_label(d.maps);
+    }
+
+    /// The least label of a network's signals: which of several signals
+    /// equally high is the highest follows the order of creation.
+    std::string first_member(const HX_NETWORK& net) const {
+        std::string least;
+        auto* iter = net.create_signal_iter();
+        while (HX_SIGNAL* s = iter->l_next()) {
+            const std::string text = label(s);
+            if (least.empty() || text < least) least = text;
+        }
+        net.delete_signal_iter(iter);
+        return least;
+    }
+
+    /// A block and its subtree, depth first, labelled by child positions.
+    void add_tree(DesignIndex& d, const HX_BLOCK* block, const std::string& path) {
+        if (block == nullptr) return;
+        d.blocks.push_back(const_cast<HX_BLOCK*>(block));
+        labels_[block] = path;
+        for (uint16_t p = 0; p < block->get_pin_count(); ++p)
+            labels_[block->get_pin(p)] = path + " pin " + std::to_string(p);
+        auto* children = block->create_child_iter();
+        size_t position = 0;
+        for (HX_BLOCK* child : drain<HX_BLOCK>(children))
+            add_tree(d, child, path + "/" + std::to_string(position++));
+        block->delete_child_iter(children);
+    }
+
+    /// Signals labelled by name, in name order; a repeated name gets the
+    /// number of its occurrence.
+    void label_named(std::vector<HX_SIGNAL*> list, const std::string& stem,
+                     std::vector<HX_SIGNAL*>& out) {
+        std::stable_sort(list.begin(), list.end(), [](const HX_SIGNAL* x, const HX_SIGNAL* y) {
+            return quoted(x->get_name()) < quoted(y->get_name());
+        });
+        std::unordered_map<std::string, int> seen;
+        for (HX_SIGNAL* signal : list) {
+            const std::string name = quoted(signal->get_name());
+            const int count = seen[name]++;
+            labels_[signal] = stem + name + (count ? "#" + std::to_string(count) : "");
+            out.push_back(signal);
+        }
+    }
+
+    template <class T>
+    void sort_by_label(std::vector<T*>& list) const {
+        std::stable_sort(list.begin(), list.end(),
+                         [this](const T* x, const T* y) { return label(x) < label(y); });
+    }
+
     void label_all(const DesignIndex& d, const std::string& prefix) {
         for (size_t i = 0; i < d.blocks.size(); ++i) {
             const std::string block = prefix + "block " + std::to_string(i);
@@ -92,12 +177,16 @@ class Index {
             labels_[list[i]] = stem + std::to_string(i);
     }
 
+    bool structural_;
     std::vector<DesignIndex> designs_;
     std::unordered_map<const void*, std::string> labels_;
 };
 
 class Comparer {
   public:
+    explicit Comparer(const CompareOptions& options)
+        : options_(options), ia_(options.structural), ib_(options.structural) {}
+
     std::string run_designs(const HX_DESIGN& a, const HX_DESIGN& b) {
         if (a.get_library() != nullptr) ia_.add_library(*a.get_library());
         if (b.get_library() != nullptr) ib_.add_library(*b.get_library());
@@ -111,10 +200,12 @@ class Comparer {
         ia_.add_library(a);
         ib_.add_library(b);
         const auto da = designs_of(a);
-        const auto db = designs_of(b);
+        const auto db = options_.extra_designs ? same_named(da, b) : designs_of(b);
         if (!same("library", "name", quoted(a.get_name()), quoted(b.get_name())) ||
             !same("library", "case sense", a.get_casesense(), b.get_casesense()) ||
             !same("library", "design count", da.size(), db.size()))
+            return diff_;
+        if (options_.extra_designs && !same("library", "designs", names(da), names(db)))
             return diff_;
         for (size_t i = 0; i < da.size(); ++i) {
             ia_.add_design(*da[i], "design " + std::to_string(i) + " ");
@@ -130,6 +221,29 @@ class Comparer {
 
   private:
     using DesignIndex = Index::DesignIndex;
+
+    /// The designs of `library` named like those of `list`, in that order;
+    /// missing ones are left out.
+    static std::vector<HX_DESIGN*> same_named(const std::vector<HX_DESIGN*>& list,
+                                              const HX_LIBRARY& library) {
+        std::vector<HX_DESIGN*> out;
+        for (const HX_DESIGN* design : list) {
+            for (HX_DESIGN* candidate : designs_of(library)) {
+                if (quoted(candidate->get_name()) == quoted(design->get_name())) {
+                    out.push_back(candidate);
+                    break;
+                }
+            }
+        }
+        return out;
+    }
+
+    static std::string names(const std::vector<HX_DESIGN*>& list) {
+        std::string out;
+        for (const HX_DESIGN* design : list)
+            out += quoted(design->get_name()) + ",";
+        return out;
+    }
 
     static std::vector<HX_DESIGN*> designs_of(const HX_LIBRARY& library) {
         std::vector<HX_DESIGN*> out;
@@ -195,14 +309,15 @@ class Comparer {
             return;
         if (!same(where, "children", labels(a.create_child_iter(), ia_),
                   labels(b.create_child_iter(), ib_)) ||
-            !same(where, "signals", labels(a.create_signal_iter(), ia_),
-                  labels(b.create_signal_iter(), ib_)))
+            !same(where, "signals", labels(a.create_signal_iter(), ia_, set_order()),
+                  labels(b.create_signal_iter(), ib_, set_order())))
             return;
         if (a.is_physical()) {
             const auto& pa = static_cast<const HX_BASEPHYSBLOCK&>(a);
             const auto& pb = static_cast<const HX_BASEPHYSBLOCK&>(b);
-            if (!same(where, "logical children", labels(pa.create_log_child_iter(), ia_),
-                      labels(pb.create_log_child_iter(), ib_)))
+            if (!same(where, "logical children",
+                      labels(pa.create_log_child_iter(), ia_, set_order()),
+                      labels(pb.create_log_child_iter(), ib_, set_order())))
                 return;
         }
         for (uint16_t i = 0; i < a.get_pin_count() && diff_.empty(); ++i) {
@@ -218,14 +333,26 @@ class Comparer {
                same(where, "width", pa->get_width(), pb->get_width());
     }
 
+    /// Whether lists in creation order are compared as sets.
+    bool set_order() const { return options_.structural; }
+
+    /// Labels joined, sorted first when `as_set`.
+    static std::string joined_labels(std::vector<std::string> list, bool as_set) {
+        if (as_set) std::sort(list.begin(), list.end());
+        std::string out = "[";
+        for (const std::string& item : list)
+            out += item + ",";
+        return out + "]";
+    }
+
     /// Labels of the items an iterator gives, joined; releases the iterator.
     template <class Iter>
-    static std::string labels(Iter* iter, const Index& index) {
-        std::string out = "[";
+    static std::string labels(Iter* iter, const Index& index, bool as_set = false) {
+        std::vector<std::string> list;
         while (auto* item = iter->l_next())
-            out += index.label(item) + ",";
+            list.push_back(index.label(item));
         delete iter;
-        return out + "]";
+        return joined_labels(std::move(list), as_set);
     }
 
     void pin(const HX_PIN& a, const HX_PIN& b, const std::string& where) {
@@ -243,12 +370,12 @@ class Comparer {
 
     template <class Owner>
     std::string conns(const Owner& owner, const Index& index) {
-        std::string out = "[";
+        std::vector<std::string> list;
         auto* iter = owner.create_conn_iter();
         while (HX_CONN* conn = iter->l_next())
-            out += index.label(conn->get_pin()) + ",";
+            list.push_back(index.label(conn->get_pin()));
         owner.delete_conn_iter(iter);
-        return out + "]";
+        return joined_labels(std::move(list), set_order());
     }
 
     void signal(const HX_SIGNAL& a, const HX_SIGNAL& b, const std::string& where) {
@@ -279,18 +406,33 @@ class Comparer {
     }
 
     void network(const HX_NETWORK& a, const HX_NETWORK& b, const std::string& where) {
-        const std::string name_a = quoted(a.get_name());
-        const std::string name_b = quoted(b.get_name());
         const HX_DESIGN* db =
             b.get_highest_signal() ? b.get_highest_signal()->get_design() : nullptr;
-        if (!same(where, "tag", a.get_tag(), b.get_tag()) ||
-            !same_label(where, "highest signal", a.get_highest_signal(), b.get_highest_signal()) ||
-            !same(where, "name", name_a, name_b) ||
+        if ((!options_.structural && !same(where, "tag", a.get_tag(), b.get_tag())) ||
+            !highest_signal(a, b, where) ||
             !same(where, "members", joined(members(a, ia_)), joined(members(b, ib_))) ||
             !same(where, "network found by tag", ib_.label(&b),
                   ib_.label(hx_find_net_tag(db, b.get_tag()))))
             return;
         props(a, b, where);
+    }
+
+    /// The highest signal and the name it gives the network. By place, of
+    /// several signals equally high the first made is the highest: then the
+    /// two need only be equally high, and the names differ with them.
+    bool highest_signal(const HX_NETWORK& a, const HX_NETWORK& b, const std::string& where) {
+        const HX_SIGNAL* ha = a.get_highest_signal();
+        const HX_SIGNAL* hb = b.get_highest_signal();
+        if (options_.structural && ia_.label(ha) != ib_.label(hb))
+            return same(where, "highest signal's level", level(ha), level(hb));
+        return same_label(where, "highest signal", ha, hb) &&
+               same(where, "name", quoted(a.get_name()), quoted(b.get_name()));
+    }
+
+    static long level(const HX_SIGNAL* signal) {
+        if (signal == nullptr) return -2;
+        const HX_BLOCK* block = signal->get_block();
+        return block == nullptr ? -1 : long(block->get_depth());
     }
 
     void map_signal(const HX_MAPSIGNAL& a, const HX_MAPSIGNAL& b, const std::string& where) {
@@ -373,18 +515,20 @@ class Comparer {
         }
     }
 
+    CompareOptions options_;
     Index ia_, ib_;
     std::string diff_;
 };
 
 }  // namespace
 
-std::string compare_designs(const HX_DESIGN& a, const HX_DESIGN& b) {
-    return Comparer().run_designs(a, b);
+std::string compare_designs(const HX_DESIGN& a, const HX_DESIGN& b, const CompareOptions& options) {
+    return Comparer(options).run_designs(a, b);
 }
 
-std::string compare_libraries(const HX_LIBRARY& a, const HX_LIBRARY& b) {
-    return Comparer().run_libraries(a, b);
+std::string compare_libraries(const HX_LIBRARY& a, const HX_LIBRARY& b,
+                              const CompareOptions& options) {
+    return Comparer(options).run_libraries(a, b);
 }
 
 }  // namespace vrx_test

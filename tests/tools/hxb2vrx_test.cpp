@@ -1,30 +1,21 @@
 // hxb2vrx run as a program: its command line, exit statuses, messages and files.
-#include <fcntl.h>
 #include <gtest/gtest.h>
-#include <spawn.h>
-#include <sys/wait.h>
 
 #include <cstdio>
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "hx_library.h"
 #include "port_file.h"
 #include "scratch_dir.h"
+#include "tool_run.h"
 #include "ut_ptrfile.h"
-
-extern char** environ;
 
 namespace {
 
-const std::string kHeaderLine2 = "// $Header: basvrxwrite,v 1.1 2003/01/23 19:53:39 Exp $";
+using vrx_test::ToolRun;
 
-struct ToolRun {
-    int status = -1;  ///< exit status; -1 when the program did not exit normally
-    std::string out;
-    std::string err;
-};
+const std::string kHeaderLine2 = "// $Header: basvrxwrite,v 1.1 2003/01/23 19:53:39 Exp $";
 
 class Hxb2vrxTest : public ::testing::Test {
   protected:
@@ -32,42 +23,8 @@ class Hxb2vrxTest : public ::testing::Test {
     /// its own. Standard output goes to `stdout_path` when one is given (and
     /// is then not read back).
     ToolRun run(const std::vector<std::string>& args, const std::string& stdout_path = "") {
-        const std::string out_path = stdout_path.empty() ? capture_.file("stdout") : stdout_path;
-        const std::string err_path = capture_.file("stderr");
-        posix_spawn_file_actions_t actions;
-        posix_spawn_file_actions_init(&actions);
-        posix_spawn_file_actions_addopen(&actions, 1, out_path.c_str(),
-                                         O_WRONLY | O_CREAT | O_TRUNC, 0600);
-        posix_spawn_file_actions_addopen(&actions, 2, err_path.c_str(),
-                                         O_WRONLY | O_CREAT | O_TRUNC, 0600);
-        posix_spawn_file_actions_addchdir_np(&actions, dir_.path().c_str());
-
-        std::vector<char*> argv{const_cast<char*>(HXB2VRX_PATH)};
-        for (const std::string& arg : args)
-            argv.push_back(const_cast<char*>(arg.c_str()));
-        argv.push_back(nullptr);
-        std::string tmpdir = "TMPDIR=" + tmp_.path();
-        std::vector<char*> envp{tmpdir.data()};
-        for (char** entry = environ; *entry != nullptr; ++entry) {
-            if (!std::string_view(*entry).starts_with("TMPDIR=")) envp.push_back(*entry);
-        }
-        envp.push_back(nullptr);
-
-        ToolRun result;
-        pid_t pid = 0;
-        const int spawned =
-            posix_spawn(&pid, HXB2VRX_PATH, &actions, nullptr, argv.data(), envp.data());
-        posix_spawn_file_actions_destroy(&actions);
-        if (spawned != 0) {
-            ADD_FAILURE() << "cannot start " << HXB2VRX_PATH;
-            return result;
-        }
-        int wait_status = 0;
-        waitpid(pid, &wait_status, 0);
-        if (WIFEXITED(wait_status)) result.status = WEXITSTATUS(wait_status);
-        if (stdout_path.empty()) result.out = ScratchDir::read_file(out_path);
-        result.err = ScratchDir::read_file(err_path);
-        return result;
+        return vrx_test::run_tool(HXB2VRX_PATH, args,
+                                  {dir_.path(), tmp_.path(), capture_.path(), stdout_path});
     }
 
     /// A design "top": a user block u1 with property MYCOLOR and an AND gate.
