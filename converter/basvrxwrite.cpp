@@ -198,8 +198,15 @@ void VRX::write_file_header() {
     write_string("// $Header: basvrxwrite,v 1.1 2003/01/23 19:53:39 Exp $", "\r\n");
 }
 
+// The library's case-sense flag and aliases are written too (CASESENSE in
+// its property list, one alias statement per alias after the designs), so
+// that reading the text back gives a library that finds the same designs.
 void VRX::write_library() {
     uint8_t opened = 0;
+    if (library->get_casesense()) {
+        write_entry(" (", "CASESENSE", false);
+        opened = 1;
+    }
     write_props(library, &opened);
     if (opened) write_string(")", "\r\n");
     UT_BLIST_ITER<HX_LIBLINK>* links = library->create_liblink_iter();
@@ -210,4 +217,10 @@ void VRX::write_library() {
         write_design();
     }
     library->delete_liblink_iter(links);
+    for (const auto& [alias, target] : library->aliases()) {
+        const VX_LEGALNAME name = vrx_legal(target->get_name(), target).keep();
+        write_indent(3, "DESIGN", name.view(), vrx_legal(alias.c_str(), target).view());
+        begin_construct();
+        end_construct();
+    }
 }

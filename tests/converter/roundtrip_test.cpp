@@ -27,7 +27,7 @@
 //   the outer side of root pins, merged signals;
 // - USER values other than 1, USER on physical blocks; primitive pin
 //   directions other than the role's own; primitives of width 1;
-// - map-signal names; map inversion except on pins of map connections; map
+// - empty map-signal names; map inversion except on pins of map connections; map
 //   connections to a logical block placed in another physical block;
 // - properties whose kind their name and value do not give back on reading
 //   (an integer under a free name reads back as a string, an empty string as
@@ -37,7 +37,7 @@
 //   and root pins, signal properties other than SIG_ALIAS, USER_ALIAS and
 //   RECOVERED_NAME (the rest belongs to the network), names that the reader
 //   takes for itself (NAME, TYPE, CONN, ...);
-// - a library's name (taken from the file name), case sense and aliases;
+// - a library's name (taken from the file name);
 // - global signals that no child pin carries;
 // - a pin reference anywhere but last among its pin's properties (the reader
 //   attaches it once all pins of the block are named);

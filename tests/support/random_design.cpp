@@ -278,7 +278,9 @@ class Generator {
         if (block == nullptr || block->get_pin_count() == 0) return;
         const auto index = static_cast<uint16_t>(below(block->get_pin_count()));
         const char* map_name = name("m");
-        HX_MAPSIGNAL* map = block->create_map_signal(index, text_ ? nullptr : map_name);
+        // Text carries a map signal's name when it has one that is not empty.
+        const bool unnamed = text_ && (map_name == nullptr || *map_name == '\0');
+        HX_MAPSIGNAL* map = block->create_map_signal(index, unnamed ? nullptr : map_name);
         if (map == nullptr) return;
         maps_.push_back(map);
         const uint32_t links = below(4);
@@ -526,8 +528,7 @@ HX_LIBRARY* make_random_library(HX_ENVIRONMENT& env, uint64_t seed, int designs,
                                 const RandomDesignOptions& options) {
     const bool text = options.text_expressible;
     std::mt19937_64 rng(seed);
-    const auto drawn_casesense = static_cast<uint8_t>(rng() % 2);
-    const uint8_t casesense = text ? 0 : drawn_casesense;
+    const auto casesense = static_cast<uint8_t>(rng() % 2);
     const std::string lib_name = "lib" + std::to_string(seed);
     const bool unnamed = rng() % 8 == 0 && !text;
     HX_LIBRARY* library = env.create_library(unnamed ? "" : lib_name.c_str(), casesense);
@@ -538,7 +539,7 @@ HX_LIBRARY* make_random_library(HX_ENVIRONMENT& env, uint64_t seed, int designs,
         HX_DESIGN* design = library->create_design(name.c_str());
         if (design == nullptr) continue;
         fill_random_design(*design, rng(), options);
-        if (rng() % 2 == 0 && !text) library->alias_design(name.c_str(), ("alias_" + name).c_str());
+        if (rng() % 2 == 0) library->alias_design(name.c_str(), ("alias_" + name).c_str());
     }
     const auto version = static_cast<int32_t>(rng() % 100);
     if (text)

@@ -47,7 +47,7 @@ struct RandomDesignOptions {
     /// - USER only on logical blocks, and only the value 1;
     /// - primitives of the width-taking types at least 2 wide, their pins
     ///   with their default directions;
-    /// - map signals without names, connected only to logical blocks that
+    /// - map signals named (not with an empty name), connected only to logical blocks that
     ///   they make the physical parent of; map inversion only on the pins of
     ///   map connections;
     /// - properties of the kind their name reads back as: free names as a
@@ -59,7 +59,7 @@ struct RandomDesignOptions {
     ///   references; no properties on roots or their pins; on signals only
     ///   SIG_ALIAS, USER_ALIAS and RECOVERED_NAME (the others belong to the
     ///   network); no names the reader reserves (NAME, TYPE, CONN, ...);
-    /// - libraries named, without case sense, aliases or integer properties.
+    /// - libraries named, without integer properties.
     bool text_expressible = false;
     /// Every block and primitive directly in a root: no hierarchy below.
     bool flat = false;

@@ -143,12 +143,13 @@ TEST_F(PipelineTest, DesignFileReadsBackToTheSameText) {
     EXPECT_EQ(written.substr(written.find(kHeaderLine2) + kHeaderLine2.size()), text(kSmallDesign));
 }
 
-TEST_F(PipelineTest, LibraryFileWritesItsPropertiesThenEachDesign) {
-    HX_LIBRARY source("L", 0);
+TEST_F(PipelineTest, LibraryFileWritesItsPropertiesThenEachDesignThenItsAliases) {
+    HX_LIBRARY source("L", 1);
     source.create_prop("LP", 1);
     source.create_prop("LF", HX_PROP_FLAG);
     source.create_design("d1")->create_logblock(nullptr, 0, "t1");
     source.create_design("d2")->create_logblock(nullptr, 0, "t2");
+    ASSERT_TRUE(source.alias_design("d2", "also d2"));
     const std::string file = dir.file("l.hxl");
     write_db_file(file, nullptr, &source);
     ASSERT_EQ(vrx.hxb_read(file.c_str()), VX_OK);
@@ -160,7 +161,7 @@ TEST_F(PipelineTest, LibraryFileWritesItsPropertiesThenEachDesign) {
     const std::string written = ScratchDir::read_file(path);
     ASSERT_EQ(written.find(kHeaderLine2), written.find("\r\n") + 2);
     EXPECT_EQ(written.substr(written.find(kHeaderLine2) + kHeaderLine2.size()), text(R"(
- (LP=1 LF)
+ (CASESENSE LP=1 LF)
 DESIGN d1 {
    BLOCK t1 0 (NAME=t1) {
    }
@@ -168,6 +169,8 @@ DESIGN d1 {
 DESIGN d2 {
    BLOCK t2 0 (NAME=t2) {
    }
+}
+DESIGN d2 "also d2" {
 }
 )"));
     EXPECT_EQ(capture.texts(PORT_MSG_STATUS),
