@@ -10,6 +10,7 @@
 #include <cstring>
 #include <memory>
 #include <string>
+#include <unordered_set>
 
 #include "hx_library.h"
 #include "hxb_propfilter.h"
@@ -201,6 +202,11 @@ void VRX::write_file_header() {
 // The library's case-sense flag and aliases are written too (CASESENSE in
 // its property list, one alias statement per alias after the designs), so
 // that reading the text back gives a library that finds the same designs.
+//
+// A library read from text holds a design for every section of its text, and
+// the designs that used them hold copies: a design whose name a section of
+// another design will carry is left out, so that each name is defined once
+// and the text reads back.
 void VRX::write_library() {
     uint8_t opened = 0;
     if (library->get_casesense()) {
@@ -209,9 +215,20 @@ void VRX::write_library() {
     }
     write_props(library, &opened);
     if (opened) write_string(")", "\r\n");
+    std::unordered_set<std::string> sections;
     UT_BLIST_ITER<HX_LIBLINK>* links = library->create_liblink_iter();
+    while (HX_LIBLINK* link = links->l_next())
+        vx_section_names(*link->get_design(), sections);
+    library->delete_liblink_iter(links);
+    links = library->create_liblink_iter();
     while (HX_LIBLINK* link = links->l_next()) {
         design = link->get_design();
+        if (sections.contains(vx_text(design->get_name()))) {
+            write_msg(__LINE__).issueStatus(
+                "   design %s is written as a section of another design\n",
+                vx_text(design->get_name()));
+            continue;
+        }
         write_msg(__LINE__).issueStatus("   processing design %s ...\n",
                                         vx_text(design->get_name()));
         write_design();

@@ -444,6 +444,34 @@ void VRX::traverse(HX_BLOCK* block, uint8_t physical) {
     end_construct();
 }
 
+namespace {
+
+void add_section_names(const HX_BLOCK* block, std::unordered_set<std::string>& names) {
+    if (block->child_count() == 0) return;
+    for_each_child(block, [&](HX_BLOCK* child) { add_section_names(child, names); });
+    const char* plain = block->get_name();
+    std::string hier = block->get_hiername();
+    if (!vx_present(plain) || hier.empty()) return;  // labelled by identity
+    if (block->find_prop("TRANSPARENT") != nullptr) hier += ".TRANSPARENT";
+    if (named_like_its_root(block, plain)) {
+        std::string clash;
+        vx_append_invented(clash, block);
+        names.insert((clash += '_') += plain);
+    } else {
+        names.insert(std::move(hier));
+    }
+}
+
+}  // namespace
+
+void vx_section_names(const HX_DESIGN& design, std::unordered_set<std::string>& names) {
+    for (const HX_BLOCK* root : {static_cast<const HX_BLOCK*>(design.get_log_root()),
+                                 static_cast<const HX_BLOCK*>(design.get_phys_root())}) {
+        if (root == nullptr) continue;
+        for_each_child(root, [&](HX_BLOCK* child) { add_section_names(child, names); });
+    }
+}
+
 void VRX::write_child(HX_BLOCK* block, uint8_t physical) {
     HX_PRIMITIVE* prim = block->get_primitive();
     if (prim != nullptr && block->child_count() == 0) {

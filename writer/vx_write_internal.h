@@ -5,6 +5,9 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <unordered_set>
+
+class HX_DESIGN;
 
 #include "port_msg.h"
 #include "vx_text.h"
@@ -26,6 +29,10 @@ void vx_write_reset_fatal();
 inline uint32_t vx_identity(const void* object) {
     return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(object));
 }
+
+/// Adds the names of the designs that reading back the sections written for
+/// `design` makes: one per block with children, as its section is labelled.
+void vx_section_names(const HX_DESIGN& design, std::unordered_set<std::string>& names);
 
 /// Appends "OBJ_$" and the identity in lower-case hexadecimal.
 void vx_append_invented(std::string& out, const void* object);
