@@ -100,8 +100,7 @@ class VRX {
     VX_STATUS vrx_read(const DARRAY_NAME& names, uint8_t is_design, uint8_t make_physroot,
                        uint8_t nograft);
     /// The same for one file.
-    VX_STATUS vrx_read(const char* name, uint8_t is_design, uint8_t make_physroot,
-                       uint8_t nograft);
+    VX_STATUS vrx_read(const char* name, uint8_t is_design, uint8_t make_physroot, uint8_t nograft);
     /// Stores what vrx_read built, the last design (.hxb) or the library
     /// (.hxl), as a database file. A null `path` names the file after the
     /// first input of vrx_read; the extension is set to fit what is written.
