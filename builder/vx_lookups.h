@@ -27,6 +27,8 @@ uint32_t vx_name_hash(std::string_view name);
 class VX_NAME_TABLE {
   public:
     void clear();
+    /// Room for `more` entries beyond those held, without growing between.
+    void reserve(std::size_t more);
     void insert(uint32_t hash, uint32_t position);
     /// Calls visit(position) for every entry of that hash.
     template <class Visit>
@@ -44,7 +46,7 @@ class VX_NAME_TABLE {
         uint32_t hash;
         uint32_t position;
     };
-    void grow();
+    void rehash(std::size_t capacity);
 
     std::vector<Entry> entries_;
     std::size_t used_ = 0;
