@@ -216,22 +216,6 @@ TEST_F(BuilderTest, NograftKeepsALibrarysDesignsApart) {
     EXPECT_EQ(u1->get_pin(0)->get_dir(), HX_PIN_OUT);  // a template's pin takes its TYPE
 }
 
-TEST_F(BuilderTest, DesignWithAGlobalOnItsRootPinIsNotGrafted) {
-    ASSERT_EQ(read("DESIGN gsub {\n"
-                   "   BLOCK gsub 1 { PIN a (TYPE=IN CONN=g) }\n"
-                   "   SIGNAL g (GLOBAL)\n"
-                   "}\n"
-                   "DESIGN top {\n"
-                   "   BLOCK top 1 { PIN i (TYPE=IN CONN=i) }\n"
-                   "   BLOCK gsub (NAME=u2) { PIN a (CONN=i) }\n"
-                   "}\n"),
-              VX_PARSE_ERROR);
-    EXPECT_EQ(reports(),
-              (std::vector<std::string>{
-                  E(7, "Global signal connected to logical root block pin on design gsub")}));
-    EXPECT_EQ(root()->child_count(), 0u);
-}
-
 TEST_F(BuilderTest, PhysicalRootDerivedFromALogicalRootMarkedPhysical) {
     const char* const text =
         "DESIGN d {\n"

@@ -112,26 +112,5 @@ TEST_F(BuilderTest, EmptyPhysicalAfterAnInvalidLogPmEndsTheRun) {
     EXPECT_EQ(root()->child_count(), 1u);
 }
 
-TEST(LogPmTest, InvalidLogPmOfAnEarlierConverterStillStopsAnEmptyPhysical) {
-    LogPmReset reset;
-    ScopedEnv device_path{"HX_DEVICE_PATH", nullptr};
-    ScratchDir dir;
-    MsgCapture capture;
-    const std::string first = dir.file("first.vrx");
-    const std::string second = dir.file("second.vrx");
-    ScratchDir::write_file(first, "(LOG_PM=nosuch)\nDESIGN d { BLOCK d 1 { PIN a (TYPE=IN) } }\n");
-    ScratchDir::write_file(second, "DESIGN e { BLOCK e 1 { PIN a } PHYSBLOCK e 1 (PHYSICAL) }\n");
-    {
-        VRX vrx;
-        ASSERT_EQ(vrx.vrx_read(first.c_str(), 1, 0, 0), VX_OK);
-    }
-    EXPECT_TRUE(capture.exits().empty());
-    VRX vrx;  // no device chosen by this converter, and none named by its text
-    EXPECT_EQ(vrx.vrx_read(second.c_str(), 1, 0, 0), VX_PARSE_ERROR);
-    EXPECT_EQ(capture.exits(), std::vector<int>{2});
-    ASSERT_NE(vrx.get_design(), nullptr);
-    EXPECT_NE(vrx.get_design()->get_phys_root(), nullptr);
-}
-
 }  // namespace
 }  // namespace builder_test
