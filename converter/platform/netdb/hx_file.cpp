@@ -1,8 +1,11 @@
 // Binary design and library files; the layout is described in hx_file.h.
 #include "hx_file.h"
 
+#include <sys/mman.h>
+
 #include <algorithm>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <mutex>
 #include <new>
@@ -131,11 +134,60 @@ bool have_hardware_crc() {
 }
 #endif
 
+// --- large buffers ---------------------------------------------------------------
+// Buffers that grow with the design go on huge pages where the system offers
+// them: page faults and TLB misses are a large part of the cost otherwise.
+
+constexpr std::size_t kHugePage = std::size_t{2} << 20;
+constexpr std::size_t kLarge = kHugePage / 2;
+
+void* big_alloc(std::size_t bytes) {
+    if (bytes < kLarge) return ::operator new(bytes);
+    const std::size_t rounded = (bytes + kHugePage - 1) / kHugePage * kHugePage;
+    void* p = std::aligned_alloc(kHugePage, rounded);
+    if (p == nullptr) throw std::bad_alloc();
+#ifdef MADV_HUGEPAGE
+    madvise(p, rounded, MADV_HUGEPAGE);
+#endif
+    return p;
+}
+
+void big_free(void* p, std::size_t bytes) {
+    if (bytes < kLarge)
+        ::operator delete(p);
+    else
+        std::free(p);
+}
+
+template <class T>
+struct BigAlloc {
+    using value_type = T;
+    BigAlloc() = default;
+    template <class U>
+    BigAlloc(const BigAlloc<U>&) {}
+    T* allocate(std::size_t n) { return static_cast<T*>(big_alloc(n * sizeof(T))); }
+    void deallocate(T* p, std::size_t n) { big_free(p, n * sizeof(T)); }
+    bool operator==(const BigAlloc&) const { return true; }
+};
+
+template <class T>
+using BigVector = std::vector<T, BigAlloc<T>>;
+
 // --- little-endian output --------------------------------------------------------
 
+/// The file's bytes in chunks that never move, so that a count can be
+/// patched after its records and nothing is copied as the file grows.
 class Output {
   public:
-    void u8(uint8_t v) { bytes_.push_back(static_cast<char>(v)); }
+    Output() = default;
+    Output(const Output&) = delete;
+    Output& operator=(const Output&) = delete;
+    ~Output() {
+        for (const Chunk& chunk : chunks_)
+            big_free(chunk.data, chunk.capacity);
+    }
+
+    void u8(uint8_t v) { put(v); }
     void u16(uint16_t v) { put(v); }
     void u32(uint32_t v) { put(v); }
     void u64(uint64_t v) { put(v); }
@@ -145,26 +197,75 @@ class Output {
             return;
         }
         const std::size_t length = std::strlen(s);
-        u32(static_cast<uint32_t>(length));
-        bytes_.append(s, length + 1);
+        char* p = room(length + 5);
+        store(p, static_cast<uint32_t>(length));
+        std::memcpy(p + 4, s, length + 1);
+        at_ = p + length + 5;
     }
-    std::size_t size() const { return bytes_.size(); }
-    /// Overwrites a u32 written earlier (a count known only afterwards).
-    void patch_u32(std::size_t at, uint32_t v) {
-        for (int i = 0; i < 4; ++i)
-            bytes_[at + i] = static_cast<char>(v >> (8 * i));
+    /// Where the next byte goes, for patch_u32.
+    char* mark() { return room(4); }
+    std::size_t size() const { return closed_ + static_cast<std::size_t>(at_ - begin_); }
+    /// Overwrites a u32 written at `where` (a count known only afterwards).
+    static void patch_u32(char* where, uint32_t v) { store(where, v); }
+
+    /// Calls `sink(data, size)` for each piece in order; false stops.
+    template <class Sink>
+    bool each_piece(Sink sink) {
+        close_chunk();
+        for (const Chunk& chunk : chunks_) {
+            if (chunk.used > 0 && !sink(chunk.data, chunk.used)) return false;
+        }
+        return true;
     }
-    std::string& bytes() { return bytes_; }
 
   private:
+    static constexpr std::size_t kChunk = std::size_t{4} << 20;
+    struct Chunk {
+        char* data;
+        std::size_t used;
+        std::size_t capacity;
+    };
+
+    template <class T>
+    static void store(char* p, T v) {
+        for (std::size_t i = 0; i < sizeof(T); ++i)
+            p[i] = static_cast<char>(v >> (8 * i));
+    }
     template <class T>
     void put(T v) {
-        char b[sizeof(T)];
-        for (std::size_t i = 0; i < sizeof(T); ++i)
-            b[i] = static_cast<char>(v >> (8 * i));
-        bytes_.append(b, sizeof(T));
+        char* p = room(sizeof(T));
+        store(p, v);
+        at_ = p + sizeof(T);
     }
-    std::string bytes_;
+    /// At least `n` contiguous bytes at the cursor.
+    [[gnu::always_inline]] char* room(std::size_t n) {
+        if (static_cast<std::size_t>(end_ - at_) < n) [[unlikely]]
+            next_chunk(n);
+        return at_;
+    }
+    /// Counts the bytes written since the last call as the current chunk's.
+    void close_chunk() {
+        if (chunks_.empty()) return;
+        const auto added = static_cast<std::size_t>(at_ - begin_);
+        chunks_.back().used += added;
+        closed_ += added;
+        begin_ = at_;
+    }
+    [[gnu::noinline]] void next_chunk(std::size_t n) {
+        close_chunk();
+        const std::size_t capacity = std::max(kChunk, (n + kHugePage - 1) / kHugePage * kHugePage);
+        chunks_.reserve(chunks_.size() + 1);
+        char* data = static_cast<char*>(big_alloc(capacity));
+        chunks_.push_back(Chunk{data, 0, capacity});
+        begin_ = at_ = data;
+        end_ = data + capacity;
+    }
+
+    std::vector<Chunk> chunks_;
+    char* begin_ = nullptr;  // bytes before this are counted in closed_
+    char* at_ = nullptr;
+    char* end_ = nullptr;
+    std::size_t closed_ = 0;  // bytes in earlier chunks
 };
 
 /// Open-addressing map from object addresses to their positions in the file,
@@ -187,7 +288,9 @@ class AddressIndex {
             i = (i + 1) & (slots_.size() - 1);
         slots_[i] = Slot{key, value};
     }
-    void prefetch(const void* key) const { __builtin_prefetch(&slots_[home(key)]); }
+    /// Asks for the key's home slot ahead of an add or find. (The slots sit
+    /// on huge pages: a prefetch that misses the TLB may be dropped.)
+    void warm(const void* key) const { __builtin_prefetch(&slots_[home(key)]); }
     uint32_t find(const void* key) const {
         for (std::size_t i = home(key);; i = (i + 1) & (slots_.size() - 1)) {
             if (slots_[i].key == key) return slots_[i].value;
@@ -204,57 +307,8 @@ class AddressIndex {
         return static_cast<std::size_t>(reinterpret_cast<uintptr_t>(key) * 0x9E3779B97F4A7C15ull >>
                                         shift_);
     }
-    std::vector<Slot> slots_;
+    BigVector<Slot> slots_;
     int shift_ = 60;
-};
-
-/// The connections of a design's signals, gathered first and then resolved
-/// to block positions in one sweep that prefetches ahead: with random
-/// netlists each lookup would otherwise wait for its own cache miss.
-struct ConnTable {
-    std::vector<uintptr_t> where;  // pin address (bit 0: inner side), then block position
-    std::vector<uint16_t> pins;
-    std::vector<uint32_t> counts;  // per signal
-    std::vector<const HX_PIN*> both_sides;
-
-    void add(const HX_PIN* pin, bool inner) {
-        where.push_back(reinterpret_cast<uintptr_t>(pin) | (inner ? 1 : 0));
-    }
-    /// True when a connection to this pin was seen before.
-    bool seen_both(const HX_PIN* pin) {
-        const bool seen = std::find(both_sides.begin(), both_sides.end(), pin) != both_sides.end();
-        both_sides.push_back(pin);
-        return seen;
-    }
-    /// Two sweeps: pins to their blocks (the block's address sits before
-    /// its pin array), then blocks to their positions.
-    void resolve(const AddressIndex& blocks) {
-        constexpr std::size_t kPin = 16, kHeader = 8;
-        const std::size_t n = where.size();
-        pins.resize(n);
-        for (std::size_t i = 0; i < n; ++i) {
-            if (i + kPin < n) __builtin_prefetch(pin_at(i + kPin));
-            if (i + kHeader < n) {
-                const HX_PIN* pin = pin_at(i + kHeader);
-                __builtin_prefetch(reinterpret_cast<const char*>(pin - pin->get_index()) -
-                                   sizeof(HX_BLOCK*));
-            }
-            const HX_PIN* pin = pin_at(i);
-            pins[i] = pin->get_index();
-            where[i] = reinterpret_cast<uintptr_t>(pin->get_block()) | (where[i] & 1);
-        }
-        auto block_of = [&](std::size_t i) {
-            return reinterpret_cast<const void*>(where[i] & ~uintptr_t{1});
-        };
-        for (std::size_t i = 0; i < n; ++i) {
-            if (i + kPin < n) blocks.prefetch(block_of(i + kPin));
-            const uint32_t side = (where[i] & 1) ? kInnerSide : 0;
-            where[i] = blocks.find(block_of(i)) | side;
-        }
-    }
-    const HX_PIN* pin_at(std::size_t i) const {
-        return reinterpret_cast<const HX_PIN*>(where[i] & ~uintptr_t{1});
-    }
 };
 
 /// Where an object property's target sits in the file.
@@ -274,6 +328,12 @@ struct Corrupt {
     throw Corrupt{what};
 }
 
+template <class T>
+void store_le(char* p, T v) {
+    for (std::size_t i = 0; i < sizeof(T); ++i)
+        p[i] = static_cast<char>(v >> (8 * i));
+}
+
 }  // namespace
 
 uint32_t HX_FILE_IO::checksum(const void* data, std::size_t size, uint32_t crc) {
@@ -290,19 +350,145 @@ uint32_t HX_FILE_IO::checksum_portable(const void* data, std::size_t size, uint3
 
 // --- writing ---------------------------------------------------------------------
 
+/// The connections of a run of signals, as block positions and pin indexes.
+/// Connections are small nodes spread over the design's memory, and walking
+/// one ring after the other waits for each node in turn. The run's rings are
+/// walked side by side instead, one node of each per round, so that their
+/// loads overlap; the pins are then resolved in sweeps of independent loads.
+class HX_FILE_IO::ConnBatch {
+  public:
+    static constexpr std::size_t kSignals = 512;
+
+    void gather(const HX_SIGNAL* const* signals, std::size_t n) {
+        walk_rings(signals, n);
+        place(n);
+        inner_sides(signals, n);
+    }
+
+    /// Blocks to their positions, with kInnerSide where it applies.
+    void resolve(const AddressIndex& blocks) {
+        constexpr std::size_t kAhead = 16;
+        const std::size_t n = blocks_.size();
+        for (std::size_t j = 0; j < n; ++j) {
+            if (j + kAhead < n) blocks.warm(blocks_[j + kAhead]);
+            where_[j] |= blocks.find(blocks_[j]);
+        }
+    }
+
+    std::size_t begin(std::size_t signal) const { return starts_[signal]; }
+    std::size_t end(std::size_t signal) const { return starts_[signal + 1]; }
+    uint32_t where(std::size_t j) const { return where_[j]; }
+    uint16_t pin(std::size_t j) const { return pins_[j]; }
+
+  private:
+    struct Walk {
+        const HX_CONN* at;
+        const HX_CONN* last;
+        uint32_t signal;
+    };
+
+    /// The pins in rounds: the i-th connection of every ring in round i.
+    void walk_rings(const HX_SIGNAL* const* signals, std::size_t n) {
+        Walk walks[kSignals];
+        std::size_t active = 0;
+        for (std::size_t i = 0; i < n; ++i) {
+            counts_[i] = 0;
+            const HX_CONN* last = signals[i]->last_conn_;
+            if (last != nullptr) walks[active++] = Walk{last, last, static_cast<uint32_t>(i)};
+        }
+        found_.clear();
+        while (active > 0) {
+            std::size_t kept = 0;
+            for (std::size_t k = 0; k < active; ++k) {
+                const Walk w = walks[k];
+                const HX_CONN* conn = w.at->next_;
+                __builtin_prefetch(conn->pin_);
+                found_.push_back(Found{conn->pin_, w.signal});
+                ++counts_[w.signal];
+                if (conn != w.last) walks[kept++] = Walk{conn, w.last, w.signal};
+            }
+            active = kept;
+        }
+    }
+
+    /// Sorts the pins by signal, keeping each ring's order; each pin to its
+    /// block and index.
+    void place(std::size_t n) {
+        starts_[0] = 0;
+        for (std::size_t i = 0; i < n; ++i)
+            starts_[i + 1] = starts_[i] + counts_[i];
+        for (std::size_t i = 0; i < n; ++i)
+            counts_[i] = starts_[i];
+        const std::size_t total = found_.size();
+        sorted_.resize(total);
+        for (const Found& f : found_)
+            sorted_[counts_[f.signal]++] = f.pin;
+        blocks_.resize(total);
+        pins_.resize(total);
+        where_.assign(total, 0);
+        constexpr std::size_t kAhead = 8;
+        for (std::size_t j = 0; j < total; ++j) {
+            if (j + kAhead < total) {
+                const HX_PIN* ahead = sorted_[j + kAhead];
+                __builtin_prefetch(reinterpret_cast<const char*>(ahead - ahead->index_) -
+                                   sizeof(HX_BLOCK*));
+            }
+            pins_[j] = sorted_[j]->index_;
+            blocks_[j] = sorted_[j]->get_block();
+        }
+    }
+
+    /// A global signal may sit on either side of a pin, or on both, in
+    /// which case its two connections to the pin are alike; the second is
+    /// taken as the inner one.
+    void inner_sides(const HX_SIGNAL* const* signals, std::size_t n) {
+        for (std::size_t i = 0; i < n; ++i) {
+            const HX_SIGNAL* signal = signals[i];
+            if (!signal->is_global()) continue;
+            both_sides_.clear();
+            for (std::size_t j = starts_[i]; j < starts_[i + 1]; ++j) {
+                const HX_PIN* pin = sorted_[j];
+                bool inner = pin->inner_ == signal;
+                if (inner && pin->outer_ == signal) inner = seen_both(pin);
+                if (inner) where_[j] = kInnerSide;
+            }
+        }
+    }
+
+    /// True when a connection to this pin was seen before.
+    bool seen_both(const HX_PIN* pin) {
+        const bool seen =
+            std::find(both_sides_.begin(), both_sides_.end(), pin) != both_sides_.end();
+        both_sides_.push_back(pin);
+        return seen;
+    }
+
+    struct Found {
+        const HX_PIN* pin;
+        uint32_t signal;
+    };
+    std::vector<Found> found_;
+    std::vector<const HX_PIN*> sorted_;
+    std::vector<const HX_BLOCK*> blocks_;
+    std::vector<uint16_t> pins_;
+    std::vector<uint32_t> where_;
+    std::vector<const HX_PIN*> both_sides_;
+    uint32_t counts_[kSignals];
+    std::size_t starts_[kSignals + 1];
+};
+
 class HX_FILE_IO::Encoder {
   public:
-    std::string design_file(const HX_DESIGN& design) {
-        out_.bytes().assign(kHeaderSize, '\0');
+    void design_file(const HX_DESIGN& design) {
+        magic_ = kDesignMagic;
         if (design.get_library() != nullptr)
             refs_.emplace(design.get_library(), ObjectRef{kObjLibrary});
         design_record(design);
         property_section();
-        return finish(kDesignMagic);
     }
 
-    std::string library_file(const HX_LIBRARY& library) {
-        out_.bytes().assign(kHeaderSize, '\0');
+    void library_file(const HX_LIBRARY& library) {
+        magic_ = kLibraryMagic;
         refs_.emplace(&library, ObjectRef{kObjLibrary});
         out_.text(library.get_name());
         out_.u8(library.get_casesense());
@@ -313,15 +499,40 @@ class HX_FILE_IO::Encoder {
             design_record(*design);
         aliases(library);
         property_section();
-        return finish(kLibraryMagic);
+    }
+
+    /// Calls `sink(data, size)` for the header and then each piece of the
+    /// body; false stops.
+    template <class Sink>
+    bool pieces(Sink sink) {
+        char header[kHeaderSize] = {};
+        std::memcpy(header, magic_, kMagicSize);
+        store_le(header + kChecksumEnd, kFormatVersion);
+        store_le(header + 16, static_cast<uint64_t>(out_.size()));
+        uint32_t crc = checksum(header + kChecksumEnd, kHeaderSize - kChecksumEnd);
+        out_.each_piece([&](const char* data, std::size_t size) {
+            crc = checksum(data, size, crc);
+            return true;
+        });
+        store_le(header + kMagicSize, crc);
+        return sink(header, kHeaderSize) && out_.each_piece(sink);
+    }
+
+    std::string joined() {
+        std::string bytes;
+        pieces([&](const char* data, std::size_t size) {
+            bytes.append(data, size);
+            return true;
+        });
+        return bytes;
     }
 
   private:
     /// The design's objects in file order, kept for object properties.
     struct DesignLists {
         const HX_DESIGN* design;
-        std::vector<const HX_SIGNAL*> signals;
-        std::vector<const HX_NETWORK*> networks;
+        BigVector<const HX_SIGNAL*> signals;
+        BigVector<const HX_NETWORK*> networks;
     };
 
     uint8_t note_props(const HX_OBJECT& object) {
@@ -339,9 +550,6 @@ class HX_FILE_IO::Encoder {
 
     void design_record(const HX_DESIGN& design) {
         lists_.push_back(DesignLists{&design, {}, {}});
-        // Room for a typical design at once: pages never written cost nothing.
-        out_.bytes().reserve(out_.size() + design.blocks_.size() * 96 +
-                             design.networks_.size() * 48);
         out_.text(design.get_name());
         out_.u8(note_props(design));
         out_.u32(design.last_tag_);
@@ -359,7 +567,7 @@ class HX_FILE_IO::Encoder {
         uint32_t parent = 0;
         for (std::size_t i = 0; i < design.blocks_.size(); ++i) {
             const HX_BLOCK* block = design.blocks_[i];
-            if (i + 16 < design.blocks_.size()) index.prefetch(design.blocks_[i + 16]);
+            if (i + 16 < design.blocks_.size()) index.warm(design.blocks_[i + 16]);
             index.add(block, static_cast<uint32_t>(i));
             if (block->parent_ != last_parent) {
                 last_parent = block->parent_;
@@ -411,31 +619,33 @@ class HX_FILE_IO::Encoder {
 
     void signal_records(const HX_DESIGN& design, const AddressIndex& blocks) {
         number_networks(design);
-        const std::vector<const HX_SIGNAL*>& signals = list_signals(design);
-        ConnTable conns;
-        for (std::size_t i = 0; i < signals.size(); ++i) {
-            prefetch_rings(signals, i);
-            gather_connections(*signals[i], conns);
-        }
-        conns.resolve(blocks);
+        const BigVector<const HX_SIGNAL*>& signals = list_signals(design);
         out_.u32(static_cast<uint32_t>(signals.size()));
-        std::size_t next = 0;
-        for (std::size_t i = 0; i < signals.size(); ++i) {
-            const HX_SIGNAL& signal = *signals[i];
-            out_.u32(owners_[i]);
-            out_.u8(note_props(signal));
-            out_.text(signal.name_);
-            out_.u32(conns.counts[i]);
-            for (uint32_t c = 0; c < conns.counts[i]; ++c, ++next) {
-                out_.u32(static_cast<uint32_t>(conns.where[next]));
-                out_.u16(conns.pins[next]);
-            }
+        ConnBatch batch;
+        for (std::size_t first = 0; first < signals.size(); first += ConnBatch::kSignals) {
+            const std::size_t n = std::min(ConnBatch::kSignals, signals.size() - first);
+            batch.gather(&signals[first], n);
+            batch.resolve(blocks);
+            for (std::size_t i = 0; i < n; ++i)
+                signal_record(*signals[first + i], owners_[first + i], batch, i);
+        }
+    }
+
+    void signal_record(const HX_SIGNAL& signal, uint32_t owner, const ConnBatch& batch,
+                       std::size_t i) {
+        out_.u32(owner);
+        out_.u8(note_props(signal));
+        out_.text(signal.name_);
+        out_.u32(static_cast<uint32_t>(batch.end(i) - batch.begin(i)));
+        for (std::size_t j = batch.begin(i); j < batch.end(i); ++j) {
+            out_.u32(batch.where(j));
+            out_.u16(batch.pin(j));
         }
     }
 
     /// File positions of the design's networks, and their highest signals.
     void number_networks(const HX_DESIGN& design) {
-        std::vector<const HX_NETWORK*>& nets = lists_.back().networks;
+        BigVector<const HX_NETWORK*>& nets = lists_.back().networks;
         net_index_.assign(design.networks_.size(), kAbsent);
         for (std::size_t i = 0; i < design.networks_.size(); ++i) {
             if (design.networks_[i] == nullptr) continue;
@@ -446,14 +656,10 @@ class HX_FILE_IO::Encoder {
     }
 
     /// The signals in file order: the globals, then each block's.
-    const std::vector<const HX_SIGNAL*>& list_signals(const HX_DESIGN& design) {
-        std::vector<const HX_SIGNAL*>& signals = lists_.back().signals;
+    const BigVector<const HX_SIGNAL*>& list_signals(const HX_DESIGN& design) {
+        BigVector<const HX_SIGNAL*>& signals = lists_.back().signals;
         owners_.clear();
         auto add = [&](const HX_SIGNAL* signal, uint32_t owner) {
-            const HX_NETWORK* net = signal->network_;
-            if (net != nullptr && net->highest_ == signal) {
-                highest_[net_index_[net->slot_]] = static_cast<uint32_t>(signals.size());
-            }
             signals.push_back(signal);
             owners_.push_back(owner);
         };
@@ -466,55 +672,28 @@ class HX_FILE_IO::Encoder {
                 if (signal != nullptr) add(signal, static_cast<uint32_t>(b + 1));
             }
         }
+        note_highest(signals);
         return signals;
     }
 
-    /// Connections are small nodes spread over the design's memory; walking
-    /// them one miss at a time dominates writing a large design. This brings
-    /// the next signals' first few ring nodes in ahead of the walk.
-    static void prefetch_rings(const std::vector<const HX_SIGNAL*>& signals, std::size_t i) {
-        // Each hop gets a few signals' worth of time to arrive before the next.
-        constexpr std::size_t kSignal = 40, kLast = 30, kFirst = 20, kSecond = 10, kThird = 5;
+    /// Which file signal is each network's highest. Signals and networks
+    /// are asked for ahead: each one is a cache miss otherwise.
+    void note_highest(const BigVector<const HX_SIGNAL*>& signals) {
+        constexpr std::size_t kSignal = 16, kNetwork = 8;
         const std::size_t n = signals.size();
-        if (i + kSignal < n) __builtin_prefetch(signals[i + kSignal]);
-        if (i + kLast < n) prefetch_node(signals[i + kLast]->last_conn_, 0);
-        if (i + kFirst < n) prefetch_node(signals[i + kFirst]->last_conn_, 1);
-        if (i + kSecond < n) prefetch_node(signals[i + kSecond]->last_conn_, 2);
-        if (i + kThird < n) prefetch_node(signals[i + kThird]->last_conn_, 3);
-    }
-
-    /// Fetches the ring node `hops` steps after `last`; the nodes before it
-    /// were asked for earlier.
-    static void prefetch_node(const HX_CONN* node, int hops) {
-        if (node == nullptr) return;
-        for (int h = 1; h < hops; ++h)
-            node = node->next_;
-        __builtin_prefetch(hops == 0 ? node : node->next_);
-    }
-
-    /// A signal's connections in order. A global signal may sit on either
-    /// side of a pin, or on both, in which case its two connections to the
-    /// pin are alike; the second is taken as the inner one.
-    static void gather_connections(const HX_SIGNAL& signal, ConnTable& table) {
-        uint32_t count = 0;
-        table.both_sides.clear();
-        const HX_CONN* last = signal.last_conn_;
-        for (const HX_CONN* conn = last; conn != nullptr && (count == 0 || conn != last);) {
-            conn = conn->next_;
-            const HX_PIN* pin = conn->pin_;
-            bool inner = signal.is_global() && pin->inner_ == &signal;
-            if (inner && pin->outer_ == &signal) {
-                inner = table.seen_both(pin);
+        for (std::size_t i = 0; i < n; ++i) {
+            if (i + kSignal < n) __builtin_prefetch(&signals[i + kSignal]->network_);
+            if (i + kNetwork < n) __builtin_prefetch(signals[i + kNetwork]->network_);
+            const HX_NETWORK* net = signals[i]->network_;
+            if (net != nullptr && net->highest_ == signals[i]) {
+                highest_[net_index_[net->slot_]] = static_cast<uint32_t>(i);
             }
-            table.add(pin, inner);
-            ++count;
         }
-        table.counts.push_back(count);
     }
 
     /// A ring of connections; `skip_first` leaves out a map signal's own pin.
     void connections(const HX_CONN* last, const AddressIndex& blocks, bool skip_first) {
-        const std::size_t at = out_.size();
+        char* at = out_.mark();
         out_.u32(0);
         uint32_t count = 0;
         if (last != nullptr) {
@@ -527,13 +706,14 @@ class HX_FILE_IO::Encoder {
                 ++count;
             } while (conn != last);
         }
-        out_.patch_u32(at, count);
+        Output::patch_u32(at, count);
     }
 
     void network_records() {
         const auto& nets = lists_.back().networks;
         out_.u32(static_cast<uint32_t>(nets.size()));
         for (std::size_t k = 0; k < nets.size(); ++k) {
+            if (k + 16 < nets.size()) __builtin_prefetch(nets[k + 16]);
             out_.u32(nets[k]->tag_);
             out_.u32(highest_[k]);
             out_.u8(note_props(*nets[k]));
@@ -553,7 +733,7 @@ class HX_FILE_IO::Encoder {
 
     /// Each physical block's logical children, in the order given.
     void parent_records(const HX_DESIGN& design, const AddressIndex& blocks) {
-        const std::size_t at = out_.size();
+        char* at = out_.mark();
         out_.u32(0);
         uint32_t count = 0;
         for (std::size_t b = 0; b < design.blocks_.size() && !design.log_children_.empty(); ++b) {
@@ -565,7 +745,7 @@ class HX_FILE_IO::Encoder {
                 out_.u32(blocks.find(child));
             ++count;
         }
-        out_.patch_u32(at, count);
+        Output::patch_u32(at, count);
     }
 
     void aliases(const HX_LIBRARY& library) {
@@ -669,35 +849,21 @@ class HX_FILE_IO::Encoder {
         }
     }
 
-    template <class T>
-    void add_refs(const std::vector<T*>& list, uint8_t kind, uint32_t design) {
+    template <class List>
+    void add_refs(const List& list, uint8_t kind, uint32_t design) {
         for (uint32_t i = 0; i < list.size(); ++i) {
             refs_.emplace(list[i], ObjectRef{kind, design, i});
         }
     }
 
-    std::string finish(const char* magic) {
-        std::string& bytes = out_.bytes();
-        Output header;
-        header.u32(kFormatVersion);
-        header.u64(bytes.size() - kHeaderSize);
-        header.u64(0);
-        std::memcpy(bytes.data(), magic, kMagicSize);
-        std::memcpy(bytes.data() + kChecksumEnd, header.bytes().data(), header.size());
-        const uint32_t crc = checksum(bytes.data() + kChecksumEnd, bytes.size() - kChecksumEnd);
-        Output sum;
-        sum.u32(crc);
-        std::memcpy(bytes.data() + kMagicSize, sum.bytes().data(), 4);
-        return std::move(bytes);
-    }
-
+    const char* magic_ = kDesignMagic;
     Output out_;
     std::vector<const HX_DESIGN*> designs_;
     std::vector<DesignLists> lists_;
     std::vector<const HX_OBJECT*> with_props_;
-    std::vector<uint32_t> net_index_;  // design's network slot -> file position
-    std::vector<uint32_t> highest_;    // file network -> its highest signal
-    std::vector<uint32_t> owners_;     // file signal -> its block's position + 1, or 0
+    BigVector<uint32_t> net_index_;  // design's network slot -> file position
+    BigVector<uint32_t> highest_;    // file network -> its highest signal
+    BigVector<uint32_t> owners_;     // file signal -> its block's position + 1, or 0
     uint32_t names_key_ = kAbsent;
     std::vector<const char*> pin_names_;
     std::unordered_map<const void*, ObjectRef> refs_;
@@ -705,11 +871,15 @@ class HX_FILE_IO::Encoder {
 };
 
 std::string HX_FILE_IO::encode(const HX_DESIGN& design) {
-    return Encoder().design_file(design);
+    Encoder encoder;
+    encoder.design_file(design);
+    return encoder.joined();
 }
 
 std::string HX_FILE_IO::encode(const HX_LIBRARY& library) {
-    return Encoder().library_file(library);
+    Encoder encoder;
+    encoder.library_file(library);
+    return encoder.joined();
 }
 
 // --- reading ---------------------------------------------------------------------
@@ -748,7 +918,7 @@ class HX_FILE_IO::Decoder {
     /// A design's objects by file position.
     struct DesignObjects {
         HX_DESIGN* design = nullptr;
-        std::vector<HX_BLOCK*> blocks;
+        BigVector<HX_BLOCK*> blocks;
         std::vector<HX_SIGNAL*> signals;
         std::vector<int32_t> signal_rank;  // -1 global, else the block's depth
         std::vector<uint32_t> block_depth;
@@ -899,9 +1069,83 @@ class HX_FILE_IO::Decoder {
         const uint32_t n = count(kMinSignal);
         objects.signals.reserve(n);
         objects.signal_rank.reserve(n);
+        ahead_ = Ahead(p_, end_, n);
+        for (uint32_t i = 0; i < Ahead::kDistance; ++i)
+            ahead_.step(objects.blocks);
         for (uint32_t i = 0; i < n; ++i)
             signal_record(objects);
     }
+
+    /// Reads connections ahead of the decoder and asks for what making them
+    /// will load: the block's entry in the list, the block, the pin. Each
+    /// is a cache miss otherwise, one after the other. Anything odd in the
+    /// bytes just ends the look ahead; the decoder itself checks everything.
+    class Ahead {
+      public:
+        static constexpr uint32_t kDistance = 24;  // connections; a stage each third
+
+        Ahead() = default;
+        Ahead(const uint8_t* p, const uint8_t* end, uint32_t records)
+            : p_(p), end_(end), records_(records) {}
+
+        /// One connection further, and each stage a step on.
+        void step(const BigVector<HX_BLOCK*>& blocks) {
+            ring_[read_++ % kDistance] = parse();
+            const Upcoming& far = back(0);
+            if (far.block < blocks.size()) __builtin_prefetch(&blocks[far.block]);
+            const Upcoming& middle = back(kDistance / 3);
+            if (middle.block < blocks.size()) __builtin_prefetch(blocks[middle.block]);
+            const Upcoming& near = back(2 * kDistance / 3);
+            if (near.block < blocks.size())
+                __builtin_prefetch(blocks[near.block]->get_pin(near.pin));
+        }
+
+      private:
+        struct Upcoming {
+            uint32_t block = kAbsent;
+            uint16_t pin = 0;
+        };
+
+        /// The connection read `k` before the last one.
+        const Upcoming& back(uint32_t k) const {
+            return ring_[(read_ + kDistance - 1 - k) % kDistance];
+        }
+
+        Upcoming parse() {
+            while (conns_ == 0) {
+                if (records_ == 0 || !skip_header()) return {};
+                --records_;
+            }
+            if (end_ - p_ < 6) return {};
+            --conns_;
+            const Upcoming next{load_le32(p_) & ~kInnerSide,
+                                static_cast<uint16_t>(p_[4] | p_[5] << 8)};
+            p_ += 6;
+            return next;
+        }
+
+        /// Past a signal record's owner, flags and name to its connections.
+        bool skip_header() {
+            if (end_ - p_ < 9) return false;
+            const uint32_t length = load_le32(p_ + 5);
+            p_ += 9;
+            if (length != kAbsent) {
+                if (static_cast<std::size_t>(end_ - p_) <= length) return false;
+                p_ += length + 1;
+            }
+            if (end_ - p_ < 4) return false;
+            conns_ = load_le32(p_);
+            p_ += 4;
+            return true;
+        }
+
+        const uint8_t* p_ = nullptr;
+        const uint8_t* end_ = nullptr;
+        uint32_t records_ = 0;
+        uint32_t conns_ = 0;
+        uint64_t read_ = 0;
+        Upcoming ring_[kDistance];
+    };
 
     void signal_record(DesignObjects& objects) {
         const uint32_t owner = u32();
@@ -919,6 +1163,7 @@ class HX_FILE_IO::Decoder {
             owner == 0 ? -1 : static_cast<int32_t>(objects.block_depth[owner - 1]));
         const uint32_t conns = count(kMinConn);
         for (uint32_t i = 0; i < conns; ++i) {
+            ahead_.step(objects.blocks);
             const uint32_t raw = u32();
             HX_BLOCK* block = block_at(objects, raw & ~kInnerSide);
             const uint16_t pin = u16();
@@ -1183,6 +1428,7 @@ class HX_FILE_IO::Decoder {
     std::unique_ptr<HX_LIBRARY> library_;
     std::vector<DesignObjects> designs_;
     std::vector<HX_OBJECT*> with_props_;
+    Ahead ahead_;
 };
 
 namespace {
@@ -1309,11 +1555,32 @@ bool readable(const UT_PTRFILE* file) {
 }
 
 /// The whole file, whether or not get_file_type took its first bytes.
-bool read_all(UT_PTRFILE* file, std::unique_ptr<uint8_t[]>& buffer, const uint8_t*& data,
-              std::size_t& size) {
+/// Bytes from big_alloc.
+class BigBytes {
+  public:
+    BigBytes() = default;
+    BigBytes(const BigBytes&) = delete;
+    BigBytes& operator=(const BigBytes&) = delete;
+    ~BigBytes() {
+        if (data_ != nullptr) big_free(data_, size_);
+    }
+    void reset(std::size_t size) {
+        auto* fresh = static_cast<uint8_t*>(big_alloc(size));
+        if (data_ != nullptr) big_free(data_, size_);
+        data_ = fresh;
+        size_ = size;
+    }
+    uint8_t* get() const { return data_; }
+
+  private:
+    uint8_t* data_ = nullptr;
+    std::size_t size_ = 0;
+};
+
+bool read_all(UT_PTRFILE* file, BigBytes& buffer, const uint8_t*& data, std::size_t& size) {
     const TakenBytes taken = recall_taken(file);
     size = static_cast<std::size_t>(file->size());
-    buffer.reset(new uint8_t[size + kMagicSize]);
+    buffer.reset(size + kMagicSize);
     uint8_t* rest = buffer.get() + taken.count;
     const std::size_t got = file->read(rest, size);
     if (got == size) {
@@ -1343,7 +1610,7 @@ std::unique_ptr<HX_LIBRARY> HX_FILE_IO::read(UT_PTRFILE* file, HX_FILE_TYPE expe
     if (!readable(file)) {
         reason = "not open for reading";
     } else {
-        std::unique_ptr<uint8_t[]> buffer;
+        BigBytes buffer;
         const uint8_t* data = nullptr;
         std::size_t size = 0;
         try {
@@ -1364,12 +1631,26 @@ std::unique_ptr<HX_LIBRARY> HX_FILE_IO::read(UT_PTRFILE* file, HX_FILE_TYPE expe
     return library;
 }
 
-bool HX_FILE_IO::write(UT_PTRFILE* file, const std::string& bytes) {
-    constexpr std::size_t kBlock = std::size_t{1} << 20;
-    if (file == nullptr || !file->is_open() || file->access() != Port::ACCESS_WRITE) return false;
-    for (std::size_t at = 0; at < bytes.size(); at += kBlock) {
-        if (!file->write(bytes.data() + at, std::min(kBlock, bytes.size() - at))) break;
-    }
+bool HX_FILE_IO::write(UT_PTRFILE* file, const HX_DESIGN& design) {
+    if (!writable(file)) return false;
+    Encoder encoder;
+    encoder.design_file(design);
+    return write(file, encoder);
+}
+
+bool HX_FILE_IO::write(UT_PTRFILE* file, const HX_LIBRARY& library) {
+    if (!writable(file)) return false;
+    Encoder encoder;
+    encoder.library_file(library);
+    return write(file, encoder);
+}
+
+bool HX_FILE_IO::writable(const UT_PTRFILE* file) {
+    return file != nullptr && file->is_open() && file->access() == Port::ACCESS_WRITE;
+}
+
+bool HX_FILE_IO::write(UT_PTRFILE* file, Encoder& encoder) {
+    encoder.pieces([&](const char* data, std::size_t size) { return file->write(data, size); });
     if (!file->failed()) return true;
     file->fail();
     return false;
@@ -1413,7 +1694,7 @@ bool HX_ENVIRONMENT::write_design(UT_PTRFILE* file, HX_DESIGN* design) {
         if (file != nullptr) file->fail();
         return report_write(file, false);
     }
-    return report_write(file, HX_FILE_IO::write(file, HX_FILE_IO::encode(*design)));
+    return report_write(file, HX_FILE_IO::write(file, *design));
 }
 
 bool HX_ENVIRONMENT::write_library(UT_PTRFILE* file, HX_LIBRARY* library) {
@@ -1421,5 +1702,5 @@ bool HX_ENVIRONMENT::write_library(UT_PTRFILE* file, HX_LIBRARY* library) {
         if (file != nullptr) file->fail();
         return report_write(file, false);
     }
-    return report_write(file, HX_FILE_IO::write(file, HX_FILE_IO::encode(*library)));
+    return report_write(file, HX_FILE_IO::write(file, *library));
 }

@@ -101,9 +101,14 @@ class HX_FILE_IO {
     // The environment's file operations (see HX_ENVIRONMENT).
     static HX_FILE_TYPE peek_type(UT_PTRFILE* file);
     static std::unique_ptr<HX_LIBRARY> read(UT_PTRFILE* file, HX_FILE_TYPE expected, bool quiet);
-    static bool write(UT_PTRFILE* file, const std::string& bytes);
+    static bool write(UT_PTRFILE* file, const HX_DESIGN& design);
+    static bool write(UT_PTRFILE* file, const HX_LIBRARY& library);
 
   private:
+    class ConnBatch;
     class Encoder;
     class Decoder;
+
+    static bool writable(const UT_PTRFILE* file);
+    static bool write(UT_PTRFILE* file, Encoder& encoder);
 };
