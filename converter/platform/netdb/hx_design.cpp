@@ -36,7 +36,7 @@ int64_t signal_rank(const HX_SIGNAL* signal) {
 void* HX_ARENA::alloc(std::size_t size, std::size_t align) {
     std::size_t pad = (align - reinterpret_cast<uintptr_t>(cur_) % align) % align;
     if (cur_ == nullptr || pad + size > left_) {
-        grow(size + align);
+        make_room(size, align);
         pad = (align - reinterpret_cast<uintptr_t>(cur_) % align) % align;
     }
     std::byte* result = cur_ + pad;
@@ -46,29 +46,81 @@ void* HX_ARENA::alloc(std::size_t size, std::size_t align) {
 }
 
 namespace {
+
+constexpr std::size_t kPage = 4096;
 constexpr std::size_t kHugePage = std::size_t{2} << 20;
 constexpr std::size_t kLargestChunk = std::size_t{4} << 20;
+// Chunks from this size on are mapped directly and faulted in by windows.
+constexpr std::size_t kMappedChunk = std::size_t{64} << 10;
+constexpr std::size_t kFaultWindow = std::size_t{64} << 10;
+// An arena turns to huge pages (4 MiB chunks) only once it holds this much,
+// so that a small design does not fault in a mostly empty huge page.
+constexpr std::size_t kHugeFrom = std::size_t{2} << 20;
+
+std::byte* map_pages(std::size_t size, std::size_t align) {
+    void* base = mmap(nullptr, size + align - kPage, PROT_READ | PROT_WRITE,
+                      MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+    if (base == MAP_FAILED) throw std::bad_alloc();
+    auto* raw = static_cast<std::byte*>(base);
+    auto* start = reinterpret_cast<std::byte*>((reinterpret_cast<uintptr_t>(raw) + align - 1) &
+                                               ~(uintptr_t{align} - 1));
+    if (start != raw) munmap(raw, static_cast<std::size_t>(start - raw));
+    const std::size_t tail = static_cast<std::size_t>(raw + size + align - kPage - start) - size;
+    if (tail > 0) munmap(start + size, tail);
+    return start;
+}
+
 }  // namespace
 
 HX_ARENA::~HX_ARENA() {
-    for (std::byte* chunk : chunks_)
-        std::free(chunk);
+    for (const Chunk& chunk : chunks_) {
+        if (chunk.mapped) {
+            munmap(chunk.start, chunk.size);
+        } else {
+            std::free(chunk.start);
+        }
+    }
+}
+
+// Starts a new chunk when the request does not fit the current one, and
+// faults in the pages it needs a window at a time: one call for many pages
+// costs much less than a page fault per page.
+void HX_ARENA::make_room(std::size_t size, std::size_t align) {
+    const std::size_t need = size + align;
+    if (cur_ == nullptr || static_cast<std::size_t>(chunk_end_ - cur_) < need) grow(need);
+    if (left_ >= need) return;
+    std::byte* ready = cur_ + left_;
+    auto* want = reinterpret_cast<std::byte*>(
+        (reinterpret_cast<uintptr_t>(cur_ + std::max(need, left_ + kFaultWindow)) + kPage - 1) &
+        ~(uintptr_t{kPage} - 1));
+    want = std::min(chunk_end_, want);
+#ifdef MADV_POPULATE_WRITE
+    madvise(ready, static_cast<std::size_t>(want - ready), MADV_POPULATE_WRITE);
+#endif
+    left_ = static_cast<std::size_t>(want - cur_);
 }
 
 void HX_ARENA::grow(std::size_t at_least) {
-    const std::size_t size = std::max(next_chunk_, at_least);
-    void* chunk = nullptr;
-    if (size >= kHugePage && size % kHugePage == 0) {
-        chunk = std::aligned_alloc(kHugePage, size);
+    std::size_t size = std::max(next_chunk_, at_least);
+    Chunk chunk{nullptr, size, size >= kMappedChunk};
+    if (!chunk.mapped) {
+        chunk.start = static_cast<std::byte*>(std::malloc(size));
+        if (chunk.start == nullptr) throw std::bad_alloc();
+        left_ = size;
+    } else if (reserved_ >= kHugeFrom && size % kHugePage == 0) {
+        chunk.start = map_pages(size, kHugePage);
 #ifdef MADV_HUGEPAGE
-        if (chunk != nullptr) madvise(chunk, size, MADV_HUGEPAGE);
+        madvise(chunk.start, size, MADV_HUGEPAGE);
 #endif
+        left_ = size;  // a fault per huge page is cheap enough
+    } else {
+        chunk.size = size = (size + kPage - 1) & ~(kPage - 1);
+        chunk.start = map_pages(size, kPage);
+        left_ = 0;  // make_room faults in what is used
     }
-    if (chunk == nullptr) chunk = std::malloc(size);
-    if (chunk == nullptr) throw std::bad_alloc();
-    chunks_.push_back(static_cast<std::byte*>(chunk));
-    cur_ = chunks_.back();
-    left_ = size;
+    chunks_.push_back(chunk);
+    cur_ = chunk.start;
+    chunk_end_ = chunk.start + size;
     reserved_ += size;
     next_chunk_ = std::min(next_chunk_ * 2, kLargestChunk);
 }
@@ -83,10 +135,15 @@ HX_BLOCK* HX_PIN::get_block() const {
 }
 
 void HX_PIN::set_name(const char* name) {
+    // Files often restate a name the pin has (primitive pins are made with
+    // theirs): keeping it spares the copy and the index drop.
+    if (name == name_ || (name != nullptr && name_ != nullptr && std::strcmp(name, name_) == 0))
+        return;
     HX_BLOCK* block = get_block();
     HX_DESIGN* design = block->get_design();
     name_ = design->intern(name);
-    design->store_->pin_names.erase(block);
+    auto& indexes = design->store_->pin_names;
+    if (!indexes.empty()) indexes.erase(block);
 }
 
 HX_MAPSIGNAL* HX_PIN::get_map_signal() const {
@@ -405,9 +462,20 @@ const char* HX_DESIGN::intern(const char* text) {
     if (text == nullptr) return nullptr;
     if (*text == '\0') return "";
     std::size_t size = std::strlen(text) + 1;
-    char* copy = static_cast<char*>(store_->text.alloc(size, 1));
+    char* copy = static_cast<char*>(store_->text->alloc(size, 1));
     std::memcpy(copy, text, size);
     return copy;
+}
+
+void HX_DESIGN::share_text_of(const HX_DESIGN& source) {
+    auto hold = [&](const std::shared_ptr<HX_ARENA>& arena) {
+        auto& held = store_->shared_text;
+        if (arena != store_->text && std::find(held.begin(), held.end(), arena) == held.end())
+            held.push_back(arena);
+    };
+    hold(source.store_->text);
+    for (const auto& arena : source.store_->shared_text)
+        hold(arena);
 }
 
 // --- the design: blocks ------------------------------------------------------
@@ -576,7 +644,13 @@ uint32_t HX_DESIGN::next_tag() {
 }
 
 HX_NETWORK* HX_DESIGN::make_network(HX_SIGNAL* first, uint32_t tag) {
-    auto* net = new (store_->objects.alloc(sizeof(HX_NETWORK), alignof(HX_NETWORK))) HX_NETWORK();
+    void* memory = store_->spare_networks;
+    if (memory != nullptr) {
+        std::memcpy(&store_->spare_networks, memory, sizeof(void*));
+    } else {
+        memory = store_->objects.alloc(sizeof(HX_NETWORK), alignof(HX_NETWORK));
+    }
+    auto* net = new (memory) HX_NETWORK();
     net->tag_ = tag;
     net->highest_ = first;
     net->last_member_ = first;
@@ -643,6 +717,10 @@ void HX_DESIGN::drop_network(HX_NETWORK* net) {
     networks_[net->slot_] = nullptr;
     --network_count_;
     net->~HX_NETWORK();
+    // Joins drop a network for each pin that links two sides; the next new
+    // network takes its place in the arena.
+    std::memcpy(static_cast<void*>(net), &store_->spare_networks, sizeof(void*));
+    store_->spare_networks = net;
 }
 
 void HX_DESIGN::unlink_member(HX_SIGNAL* signal) {

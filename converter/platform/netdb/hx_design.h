@@ -67,6 +67,7 @@ class HX_PIN : public HX_OBJECT {
     friend class HX_DESIGN;
     friend class HX_BLOCK;
     friend class HX_FILE_IO;
+    friend class HX_GRAFT;
     HX_PIN() = default;
 
     const char* name_ = nullptr;
@@ -155,6 +156,7 @@ class HX_BLOCK : public HX_OBJECT {
   private:
     friend class HX_DESIGN;
     friend class HX_FILE_IO;
+    friend class HX_GRAFT;
 
     HX_BLOCK_LISTS& lists();
     const std::vector<HX_SIGNAL*>* signal_list() const {
@@ -528,6 +530,8 @@ class HX_DESIGN : public HX_OBJECT {
     void leave_network_for(HX_SIGNAL* signal, HX_NETWORK* net);
     void delete_signal(HX_SIGNAL* signal);
     void rename_global(HX_SIGNAL* signal, const char* name);
+    /// Lets this design's blocks and pins point at names held by `source`.
+    void share_text_of(const HX_DESIGN& source);
     bool owns(const HX_BLOCK* block) const { return block && block->design_ == this; }
 
     HX_LIBRARY* library_;

@@ -1,7 +1,10 @@
 // Instances of other designs and grafting their contents.
+#include <algorithm>
+#include <cstdint>
 #include <cstring>
 #include <unordered_map>
 #include <unordered_set>
+#include <vector>
 
 #include "hx_design.h"
 #include "hx_library.h"
@@ -20,12 +23,56 @@ bool is_tag_prop(const HX_PROPERTY* prop) {
             std::strcmp(name, "JOINED") == 0);
 }
 
-void copy_pin_state(const HX_PIN& from, HX_PIN& to) {
-    to.set_name(from.get_name());
-    to.set_dir(from.get_dir());
-    to.set_mapinv(from.get_mapinv());
-    to.set_inverted(from.get_inverted());
-}
+/// Source objects to their copies: open addressing over pointer keys
+/// (linear probing, at most half full, nothing removed). A graft maps every
+/// block and signal it copies, so this is leaner and quicker than a map
+/// with a node per entry.
+template <class Key, class Value>
+class COPY_MAP {
+  public:
+    void reserve(std::size_t count) {
+        std::size_t capacity = 16;
+        while (capacity < 2 * count)
+            capacity *= 2;
+        if (capacity > slots_.size()) rehash(capacity);
+    }
+    void emplace(const Key* key, Value* value) {
+        if (2 * (used_ + 1) > slots_.size()) rehash(std::max<std::size_t>(16, 2 * slots_.size()));
+        Slot& slot = slots_[locate(key)];
+        if (slot.key == nullptr) {
+            slot = {key, value};
+            ++used_;
+        }
+    }
+    /// The copy of `key`, or null.
+    Value* find(const Key* key) const {
+        return slots_.empty() ? nullptr : slots_[locate(key)].value;
+    }
+    bool contains(const Key* key) const { return find(key) != nullptr; }
+
+  private:
+    struct Slot {
+        const Key* key = nullptr;
+        Value* value = nullptr;
+    };
+    std::size_t locate(const Key* key) const {
+        const std::size_t mask = slots_.size() - 1;
+        std::size_t i = (reinterpret_cast<uintptr_t>(key) * 0x9E3779B97F4A7C15ull >> 32) & mask;
+        while (slots_[i].key != nullptr && slots_[i].key != key)
+            i = (i + 1) & mask;
+        return i;
+    }
+    void rehash(std::size_t capacity) {
+        std::vector<Slot> old(capacity);
+        old.swap(slots_);
+        for (const Slot& slot : old) {
+            if (slot.key != nullptr) slots_[locate(slot.key)] = slot;
+        }
+    }
+
+    std::vector<Slot> slots_;
+    std::size_t used_ = 0;
+};
 
 }  // namespace
 
@@ -38,6 +85,14 @@ class HX_GRAFT {
 
     void run(const HX_BLOCK* source_root, HX_BLOCK* instance, bool copy_maps,
              DARRAY_NAME* globals_out);
+    /// Gives the pins of `to` the names of those of `from` (of `source`),
+    /// shared (see HX_DESIGN::share_text_of) and without the checks of
+    /// HX_PIN::set_name: `to` is new and has no pin name index yet.
+    static void share_pin_names(const HX_DESIGN& source, const HX_BLOCK* from, HX_BLOCK* to) {
+        to->get_design()->share_text_of(source);
+        for (uint16_t i = 0; i < from->get_pin_count(); ++i)
+            to->pins_[i].name_ = from->pins_[i].name_;
+    }
 
   private:
     void copy_children(const HX_BLOCK* from, HX_BLOCK* to);
@@ -47,7 +102,9 @@ class HX_GRAFT {
     void copy_connections(const HX_BLOCK* source_root, DARRAY_NAME* globals_out);
     void connect_signal(HX_SIGNAL* from, HX_SIGNAL* to, const HX_BLOCK* source_root);
     void copy_network_props();
+    bool source_has_network_props() const;
     void copy_maps();
+    static void copy_pin_state(const HX_PIN& from, HX_PIN& to);
     void copy_props(const HX_OBJECT& from, HX_OBJECT& to) const {
         if (copy_props_) to.copy_properties(from.get_props(), 0);
     }
@@ -55,19 +112,20 @@ class HX_GRAFT {
     HX_DESIGN& target_;
     const HX_DESIGN& source_;
     bool copy_props_;
-    std::unordered_map<const HX_BLOCK*, HX_BLOCK*> blocks_;
-    std::unordered_map<const HX_SIGNAL*, HX_SIGNAL*> signals_;
+    COPY_MAP<HX_BLOCK, HX_BLOCK> blocks_;
+    COPY_MAP<HX_SIGNAL, HX_SIGNAL> signals_;
 };
 
 void HX_GRAFT::run(const HX_BLOCK* source_root, HX_BLOCK* instance, bool copy_maps,
                    DARRAY_NAME* globals_out) {
+    target_.share_text_of(source_);
+    blocks_.reserve(source_.block_count());
     blocks_.emplace(source_root, instance);
     copy_children(source_root, instance);
     // Signals in source block order, so the copy's order is the source's.
     auto* iter = source_.create_block_iter();
     while (HX_BLOCK* block = iter->l_next()) {
-        auto copy = blocks_.find(block);
-        if (copy != blocks_.end()) copy_signals(block, copy->second);
+        if (HX_BLOCK* copy = blocks_.find(block)) copy_signals(block, copy);
     }
     source_.delete_block_iter(iter);
     copy_connections(source_root, globals_out);
@@ -84,22 +142,30 @@ void HX_GRAFT::copy_children(const HX_BLOCK* from, HX_BLOCK* to) {
     from->delete_child_iter(iter);
 }
 
+// The copy shares the source's names (see HX_DESIGN::share_text_of).
+void HX_GRAFT::copy_pin_state(const HX_PIN& from, HX_PIN& to) {
+    to.name_ = from.name_;
+    to.dir_ = from.dir_;
+    to.mapinv_ = from.mapinv_;
+    to.inverted_ = from.inverted_;
+}
+
 HX_BLOCK* HX_GRAFT::copy_block(const HX_BLOCK* from, HX_BLOCK* parent) {
     HX_BLOCK* copy = nullptr;
     const HX_PRIMITIVE* prim = from->get_primitive();
     if (from->is_physical()) {
         auto* phys_parent = static_cast<HX_BASEPHYSBLOCK*>(parent);
-        copy = prim
-                   ? static_cast<HX_BLOCK*>(target_.create_physprim(
-                         phys_parent, prim->get_type(), prim->get_width(), from->get_name()))
-                   : target_.create_physblock(phys_parent, from->get_pin_count(), from->get_name());
+        copy = prim ? static_cast<HX_BLOCK*>(target_.create_physprim(phys_parent, prim->get_type(),
+                                                                     prim->get_width(), nullptr))
+                    : target_.create_physblock(phys_parent, from->get_pin_count(), nullptr);
     } else {
         auto* log_parent = static_cast<HX_BASELOGBLOCK*>(parent);
-        copy = prim ? static_cast<HX_BLOCK*>(target_.create_logprim(
-                          log_parent, prim->get_type(), prim->get_width(), from->get_name()))
-                    : target_.create_logblock(log_parent, from->get_pin_count(), from->get_name());
+        copy = prim ? static_cast<HX_BLOCK*>(target_.create_logprim(log_parent, prim->get_type(),
+                                                                    prim->get_width(), nullptr))
+                    : target_.create_logblock(log_parent, from->get_pin_count(), nullptr);
     }
     if (copy == nullptr) return nullptr;
+    copy->name_ = from->name_;
     copy->set_user(from->get_user());
     copy_props(*from, *copy);
     for (uint16_t i = 0; i < from->get_pin_count(); ++i) {
@@ -121,8 +187,7 @@ void HX_GRAFT::copy_signals(const HX_BLOCK* from, HX_BLOCK* to) {
 }
 
 HX_SIGNAL* HX_GRAFT::target_global(HX_SIGNAL* global, DARRAY_NAME* globals_out) {
-    auto found = signals_.find(global);
-    if (found != signals_.end()) return found->second;
+    if (HX_SIGNAL* found = signals_.find(global)) return found;
     HX_SIGNAL* copy = target_.find_global_signal(global->get_name());
     if (copy == nullptr) copy = target_.create_global_signal(global->get_name());
     if (copy == nullptr) return nullptr;
@@ -150,7 +215,7 @@ void HX_GRAFT::copy_connections(const HX_BLOCK* source_root, DARRAY_NAME* global
         ordered.push_back(global);
     source_.delete_global_iter(globals);
     for (HX_SIGNAL* s : ordered) {
-        HX_SIGNAL* copy = s->is_global() ? nullptr : signals_.at(s);
+        HX_SIGNAL* copy = s->is_global() ? nullptr : signals_.find(s);
         if (s->is_global()) {
             bool used = false;
             auto* conns = s->create_conn_iter();
@@ -170,16 +235,31 @@ void HX_GRAFT::connect_signal(HX_SIGNAL* from, HX_SIGNAL* to, const HX_BLOCK* so
     auto* conns = from->create_conn_iter();
     while (HX_CONN* c = conns->l_next()) {
         const HX_BLOCK* block = c->get_block();
-        auto mapped = blocks_.find(block);
-        if (mapped == blocks_.end()) continue;
+        HX_BLOCK* mapped = blocks_.find(block);
+        if (mapped == nullptr) continue;
         // On the source root only the inner side belongs to the contents.
         if (block == source_root && c->get_pin()->get_inner_signal() != from) continue;
-        target_.create_conn(to, mapped->second, c->get_index());
+        target_.create_conn(to, mapped, c->get_index());
     }
     from->delete_conn_iter(conns);
 }
 
+bool HX_GRAFT::source_has_network_props() const {
+    auto* iter = source_.create_network_iter();
+    bool found = false;
+    while (HX_NETWORK* net = iter->l_next()) {
+        if (net->get_props() != nullptr) {
+            found = true;
+            break;
+        }
+    }
+    source_.delete_network_iter(iter);
+    return found;
+}
+
 void HX_GRAFT::copy_network_props() {
+    // Without properties to copy, the walk over every member is not needed.
+    if (!copy_props_ || !source_has_network_props()) return;
     std::unordered_map<uint32_t, uint32_t> tags;
     std::vector<std::pair<const HX_NETWORK*, HX_NETWORK*>> pairs;
     auto* iter = source_.create_network_iter();
@@ -187,9 +267,8 @@ void HX_GRAFT::copy_network_props() {
         auto* members = net->create_signal_iter();
         HX_NETWORK* copy = nullptr;
         while (HX_SIGNAL* s = members->l_next()) {
-            auto found = signals_.find(s);
-            if (found != signals_.end()) {
-                copy = found->second->get_network();
+            if (HX_SIGNAL* found = signals_.find(s)) {
+                copy = found->get_network();
                 break;
             }
         }
@@ -199,7 +278,6 @@ void HX_GRAFT::copy_network_props() {
         pairs.emplace_back(net, copy);
     }
     source_.delete_network_iter(iter);
-    if (!copy_props_) return;
     for (auto& [from, to] : pairs) {
         const HX_PROPLIST* props = from->get_props();
         if (props == nullptr) continue;
@@ -217,17 +295,17 @@ void HX_GRAFT::copy_network_props() {
 void HX_GRAFT::copy_maps() {
     auto* iter = source_.create_mapsignal_iter();
     while (HX_MAPSIGNAL* m = iter->l_next()) {
-        auto block = blocks_.find(m->get_block());
-        if (block == blocks_.end()) continue;
-        auto* phys = static_cast<HX_BASEPHYSBLOCK*>(block->second);
+        HX_BLOCK* block = blocks_.find(m->get_block());
+        if (block == nullptr) continue;
+        auto* phys = static_cast<HX_BASEPHYSBLOCK*>(block);
         HX_MAPSIGNAL* copy = phys->create_map_signal(m->get_pin_index(), m->get_name());
         if (copy == nullptr) continue;
         copy_props(*m, *copy);
         auto* conns = m->create_conn_iter();
         conns->l_next();  // the physical pin itself
         while (HX_CONN* c = conns->l_next()) {
-            auto log = blocks_.find(c->get_block());
-            if (log != blocks_.end()) copy->create_mapconn(log->second, c->get_index());
+            if (HX_BLOCK* log = blocks_.find(c->get_block()))
+                copy->create_mapconn(log, c->get_index());
         }
         m->delete_conn_iter(conns);
     }
@@ -235,11 +313,10 @@ void HX_GRAFT::copy_maps() {
     auto* blocks = source_.create_block_iter();
     while (HX_BLOCK* block = blocks->l_next()) {
         HX_BASEPHYSBLOCK* parent = block->get_phys_parent();
-        auto log = blocks_.find(block);
-        auto phys = parent ? blocks_.find(parent) : blocks_.end();
-        if (log != blocks_.end() && phys != blocks_.end())
-            target_.set_block_phys_parent(log->second,
-                                          static_cast<HX_BASEPHYSBLOCK*>(phys->second));
+        HX_BLOCK* log = blocks_.find(block);
+        HX_BLOCK* phys = parent ? blocks_.find(parent) : nullptr;
+        if (log != nullptr && phys != nullptr)
+            target_.set_block_phys_parent(log, static_cast<HX_BASEPHYSBLOCK*>(phys));
     }
     source_.delete_block_iter(blocks);
 }
@@ -262,10 +339,9 @@ template <class Made>
 Made* finish_instance(Made* made, const HX_BLOCK* root, const HX_DESIGN* other,
                       uint8_t omit_type_prop) {
     if (made == nullptr) return nullptr;
-    for (uint16_t i = 0; i < root->get_pin_count(); ++i) {
-        made->get_pin(i)->set_name(root->get_pin(i)->get_name());
+    HX_GRAFT::share_pin_names(*other, root, made);
+    for (uint16_t i = 0; i < root->get_pin_count(); ++i)
         made->get_pin(i)->set_dir(root->get_pin(i)->get_dir());
-    }
     if (!omit_type_prop) made->create_prop("TYPE", other->get_name(), 1);
     return made;
 }

@@ -15,9 +15,11 @@ class HX_BLOCK;
 class HX_NETWORK;
 
 /// Bump allocator over chunks that grow from 4 KiB to 4 MiB. Nothing is
-/// freed before the arena itself; the owner runs destructors. Large chunks
-/// are aligned for huge pages and offered to the system as such, which
-/// spares a large design hundreds of thousands of page faults.
+/// freed before the arena itself; the owner runs destructors. Page faults
+/// are dear: chunks of 64 KiB and more are mapped and their pages faulted in
+/// a window at a time, and once the arena holds 2 MiB its chunks go on huge
+/// pages. Small designs so never fault in a mostly empty huge page, while a
+/// large one is spared hundreds of thousands of faults.
 class HX_ARENA {
   public:
     HX_ARENA() = default;
@@ -29,19 +31,26 @@ class HX_ARENA {
     std::size_t bytes_reserved() const { return reserved_; }
 
   private:
+    struct Chunk {
+        std::byte* start;
+        std::size_t size;
+        bool mapped;  // else from malloc
+    };
+    void make_room(std::size_t size, std::size_t align);
     void grow(std::size_t at_least);
 
-    std::vector<std::byte*> chunks_;
+    std::vector<Chunk> chunks_;
     std::byte* cur_ = nullptr;
-    std::size_t left_ = 0;
+    std::size_t left_ = 0;  // up to the end of what is faulted in
+    std::byte* chunk_end_ = nullptr;
     std::size_t next_chunk_ = 4096;
     std::size_t reserved_ = 0;
 };
 
 /// Networks by tag. Tags are handed out in rising order, so most sit in a
 /// plain array indexed by tag, which also keeps neighbouring tags close in
-/// memory. The array never grows beyond about twice the number of networks;
-/// tags beyond it (from a file, say) go to an open-addressing table (linear
+/// memory. The array never grows beyond about four times the number of
+/// networks; tags beyond it (from a file, say) go to an open-addressing table (linear
 /// probing, backward-shift removal, at most half full). `Net` is anything
 /// with get_tag(); the database uses HX_NETWORK.
 template <class Net = HX_NETWORK>
@@ -102,14 +111,17 @@ void HX_TAG_TABLE<Net>::erase(uint32_t tag) {
     }
 }
 
-// Makes the array reach `tag` when that keeps it within about twice the
+// Makes the array reach `tag` when the tag lies within about twice the
 // number of networks; moves the networks it now covers out of the table.
+// The array at least doubles (up to twice that bound), so that tags which
+// run just ahead of the bound, as when joins keep the count low, do not
+// resize it at every insertion.
 template <class Net>
 bool HX_TAG_TABLE<Net>::grow_dense(uint32_t tag) {
     const std::size_t limit = 2 * (used_ + 1) + 4096;
     if (tag >= limit) return false;
     const std::size_t size =
-        std::min(limit, std::max<std::size_t>(tag + std::size_t{1}, dense_.size() * 2));
+        std::min(2 * limit, std::max<std::size_t>(tag + std::size_t{1}, dense_.size() * 2));
     dense_.resize(size, nullptr);
     if (sparse_used_ == 0) return true;
     std::vector<Net*> covered;
@@ -188,7 +200,12 @@ using HX_PIN_NAME_INDEX = std::unordered_map<std::string_view, uint16_t>;
 
 struct HX_DESIGN_STORAGE {
     HX_ARENA objects;
-    HX_ARENA text;
+    // Names of blocks and pins. A graft lets the copies share the source's
+    // names, so the target holds on to the source's text (and to what that
+    // shares in turn): names never change in place, only get replaced.
+    std::shared_ptr<HX_ARENA> text = std::make_shared<HX_ARENA>();
+    std::vector<std::shared_ptr<HX_ARENA>> shared_text;
     HX_TAG_TABLE<> tags;
     std::unordered_map<const HX_BLOCK*, HX_PIN_NAME_INDEX> pin_names;
+    void* spare_networks = nullptr;  // dropped networks' memory, chained through it
 };

@@ -1,12 +1,16 @@
 #include <gtest/gtest.h>
 
+#include <cstring>
 #include <map>
+#include <memory>
 #include <random>
+#include <set>
 #include <string>
 #include <vector>
 
 #include "hx_library.h"
 #include "hx_storage.h"
+#include "ut_btr_tree.h"
 
 namespace {
 
@@ -151,6 +155,118 @@ TEST_F(DesignTest, FindPinAndCheckPinsFollowRenames) {
     root->get_pin(6)->set_name("");
     EXPECT_TRUE(root->check_pins(0));
     EXPECT_FALSE(root->check_pins(1));
+}
+
+// Restating a pin's name keeps it; absent and empty names stay apart.
+TEST_F(DesignTest, PinNamesRestatedOrSwitchedBetweenAbsentAndEmpty) {
+    HX_LOGBLOCK* root = design->create_logblock(nullptr, 20, "top");
+    for (uint16_t i = 0; i < 20; ++i)
+        root->get_pin(i)->set_name(("p" + std::to_string(i)).c_str());
+    EXPECT_EQ(root->find_pin("p7", 0), 7);  // builds the index
+    root->get_pin(7)->set_name("p7");
+    root->get_pin(8)->set_name("x");
+    EXPECT_EQ(root->find_pin("p7", 0), 7);
+    EXPECT_EQ(root->find_pin("x", 0), 8);
+    EXPECT_EQ(root->find_pin("p8", 0), HX_NO_INDEX);
+
+    HX_PIN* pin = root->get_pin(9);
+    pin->set_name("");
+    pin->set_name(nullptr);
+    EXPECT_EQ(pin->get_name(), nullptr);
+    pin->set_name("");
+    ASSERT_NE(pin->get_name(), nullptr);
+    EXPECT_STREQ(pin->get_name(), "");
+
+    HX_LOGPRIM* gate = design->create_logprim(root, HX_PRIM_AND, 2, "g");
+    gate->get_pin(1)->set_name("IN1");
+    gate->get_pin(2)->set_name("Z");
+    EXPECT_STREQ(gate->get_pin(1)->get_name(), "IN1");
+    EXPECT_STREQ(gate->get_pin(2)->get_name(), "Z");
+}
+
+// Long names and many objects cross chunk, fault-window and huge-page
+// boundaries of the arenas; every name must read back intact.
+TEST_F(DesignTest, NamesSurviveEveryKindOfArenaChunk) {
+    HX_LOGBLOCK* root = design->create_logblock(nullptr, 0, "top");
+    const std::string long_name(300000, 'n');
+    HX_SIGNAL* big = design->create_signal(root, long_name.c_str());
+    std::vector<HX_SIGNAL*> signals;
+    std::vector<HX_BLOCK*> blocks;
+    for (int i = 0; i < 60000; ++i) {
+        const std::string name = "s" + std::to_string(i) + std::string(i % 23, 'x');
+        signals.push_back(design->create_signal(root, name.c_str()));
+        blocks.push_back(design->create_logprim(root, HX_PRIM_BUF, 0, name.c_str()));
+    }
+    HX_SIGNAL* last = design->create_signal(root, long_name.c_str());
+    EXPECT_EQ(big->get_name(), long_name);
+    EXPECT_EQ(last->get_name(), long_name);
+    for (int i = 0; i < 60000; ++i) {
+        const std::string name = "s" + std::to_string(i) + std::string(i % 23, 'x');
+        ASSERT_EQ(signals[i]->get_name(), name);
+        ASSERT_EQ(blocks[i]->get_name(), name);
+        ASSERT_EQ(blocks[i]->get_pin(1)->get_block(), blocks[i]);
+    }
+}
+
+// Joins drop networks, whose memory new networks take over: tags, places
+// and members must stay consistent through many rounds of both.
+TEST_F(DesignTest, NetworksMadeAfterJoinsKeepTagsAndPlacesApart) {
+    HX_LOGBLOCK* root = design->create_logblock(nullptr, 0, "top");
+    std::vector<HX_NETWORK*> made;
+    for (int round = 0; round < 50; ++round) {
+        HX_LOGBLOCK* child = design->create_logblock(root, 4, nullptr);
+        for (uint16_t i = 0; i < 4; ++i) {
+            design->create_conn(design->create_signal(root, "o"), child, i);
+            design->create_conn(design->create_signal(child, "i"), child, i);  // joins
+        }
+        made.push_back(design->create_signal(root, "fresh")->get_network());
+    }
+    std::set<uint32_t> tags;
+    size_t live = 0;
+    for (size_t slot = 0; slot < design->network_slots(); ++slot) {
+        HX_NETWORK* net = design->network_at(slot);
+        if (net == nullptr) continue;
+        ++live;
+        EXPECT_EQ(net->get_slot(), slot);
+        EXPECT_EQ(design->find_net_tag(net->get_tag()), net);
+        EXPECT_TRUE(tags.insert(net->get_tag()).second);
+        EXPECT_EQ(drain(net->create_signal_iter()).size(), net->get_member_count());
+    }
+    EXPECT_EQ(live, design->network_count());
+    EXPECT_EQ(live, 50u * 5);
+    for (HX_NETWORK* net : made)
+        EXPECT_EQ(net->get_member_count(), 1u);
+}
+
+// The signal cache's table grows by half into sizes of every kind, up to
+// huge pages; lookups, removals and copies must agree with a plain map.
+TEST(SignalTableTest, AgreesWithAMapAcrossGrowthAndCopies) {
+    HX_LIBRARY library("lib", 0);
+    HX_DESIGN* design = library.create_design("d");
+    HX_LOGBLOCK* root = design->create_logblock(nullptr, 0, "top");
+    auto by_name = [](const HX_SIGNAL* s, const char* key) {
+        return std::strcmp(s->get_name(), key);
+    };
+    UT_BTR_TREE<HX_SIGNAL> table(by_name);
+    std::map<std::string, HX_SIGNAL*> expected;
+    for (int i = 0; i < 150000; ++i) {
+        const std::string name = "n" + std::to_string(i);
+        HX_SIGNAL* s = design->create_signal(root, name.c_str());
+        ASSERT_TRUE(table.s_add(s->get_name(), s));
+        expected.emplace(name, s);
+        if (i % 7 == 3) {
+            const std::string gone = "n" + std::to_string(i / 2);
+            EXPECT_EQ(table.s_remove(gone.c_str()), expected[gone]);
+            expected.erase(gone);
+        }
+    }
+    UT_BTR_TREE<HX_SIGNAL> copy(table);
+    table.flush(false);
+    EXPECT_EQ(copy.count(), expected.size());
+    for (const auto& [name, s] : expected)
+        ASSERT_EQ(copy.s_find(name.c_str()), s);
+    EXPECT_EQ(copy.s_find("n1"), nullptr);  // removed at i == 3
+    EXPECT_EQ(table.s_find("n0"), nullptr);
 }
 
 // A two-level net: top/n -> pin of u1 -> u1/m -> pin of a primitive.
@@ -407,6 +523,32 @@ TEST_F(GraftTest, GraftRefusesMismatchedPinsAndChangesNothing) {
     EXPECT_EQ(top->instantiate(top_root, nullptr, 0), nullptr);
     HX_PHYSBLOCK* phys_root = top->create_physblock(nullptr, 0, "top");
     EXPECT_EQ(top->instantiate(phys_root, leaf, 0), nullptr);  // leaf has no physical root
+}
+
+// Copies share the names of what they were grafted from, also at second
+// hand; the names must outlive the designs they came from.
+TEST_F(GraftTest, GraftedNamesOutliveTheirSourceDesigns) {
+    auto mid = std::make_unique<HX_DESIGN>(&library, "mid");
+    HX_LOGBLOCK* mid_root = mid->create_logblock(nullptr, 0, "mid");
+    HX_LOGBLOCK* inner = mid->instantiate(mid_root, leaf, 1);
+    ASSERT_EQ(mid->graft(inner, leaf, 0, 0, nullptr, 0), inner);
+
+    HX_LIBRARY other("other", 0);
+    HX_DESIGN* last = other.create_design("last");
+    HX_LOGBLOCK* last_root = last->create_logblock(nullptr, 0, "last");
+    HX_LOGBLOCK* inst = last->instantiate(last_root, mid.get(), 1);
+    ASSERT_EQ(last->graft(inst, mid.get(), 0, 0, nullptr, 0), inst);
+    mid.reset();
+    leaf->get_log_root()->get_pin(0)->set_name("renamed");
+
+    auto copies = drain(inst->create_child_iter());
+    ASSERT_EQ(copies.size(), 1u);
+    EXPECT_STREQ(copies[0]->get_name(), "leaf");
+    EXPECT_STREQ(copies[0]->get_pin(0)->get_name(), "a");
+    auto prims = drain(copies[0]->create_child_iter());
+    ASSERT_EQ(prims.size(), 2u);
+    EXPECT_STREQ(prims[0]->get_hiername(), "last/mid/leaf/b");
+    EXPECT_STREQ(prims[0]->get_pin(0)->get_name(), "IN");
 }
 
 TEST(LibraryTest, NamesAndAliasesFollowTheCaseSenseFlag) {
