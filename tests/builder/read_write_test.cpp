@@ -120,6 +120,21 @@ TEST_F(BuilderTest, DatabaseFileNamesFollowTheFirstInputOrTheGivenPath) {
     }
 }
 
+TEST_F(BuilderTest, LongPathsAreReadAndWritten) {
+    const std::string sub = dir.file(std::string(200, 'd'));
+    ASSERT_EQ(::mkdir(sub.c_str(), 0700), 0);
+    const std::string stem = sub + "/" + std::string(70, 'n');
+    ASSERT_GT(stem.size(), 270u);
+    ScratchDir::write_file(stem + ".vrx", kClean);
+    ASSERT_EQ(vrx.vrx_read(stem.c_str(), 1, 0, 0), VX_OK);
+    EXPECT_STREQ(vrx.get_library()->get_name(), std::string(70, 'n').c_str());
+    ASSERT_EQ(vrx.hxb_write(nullptr), VX_OK);
+    EXPECT_EQ(file_type(stem + ".hxb"), HX_FILE_DESIGN);
+    const std::string other = sub + "/" + std::string(60, 'o');
+    ASSERT_EQ(vrx.hxb_write((other + ".txt").c_str()), VX_OK);
+    EXPECT_EQ(file_type(other + ".hxb"), HX_FILE_DESIGN);
+}
+
 TEST_F(BuilderTest, WritingWithoutAnythingReadIsAnError) {
     EXPECT_EQ(vrx.hxb_write(nullptr), VX_FILE_ERROR);
     EXPECT_FALSE(capture.texts(PORT_MSG_ERROR).empty());
