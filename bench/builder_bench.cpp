@@ -57,6 +57,7 @@
 
 #include "and_design.h"
 #include "hx_library.h"
+#include "temp_folder.h"
 #include "vrx.h"
 
 namespace {
@@ -158,23 +159,6 @@ fs::path netlist_dir() {
     if (const char* dir = std::getenv("VRX_NETLISTS")) return dir;
     return VRX_DEFAULT_NETLISTS;
 }
-
-/// A fresh folder under $TMPDIR (or /tmp), removed with its files.
-struct TempFolder {
-    TempFolder() {
-        std::string pattern = (fs::temp_directory_path() / "vrx-builder-bench-XXXXXX").string();
-        if (::mkdtemp(pattern.data()) == nullptr) throw std::runtime_error("mkdtemp failed");
-        path = pattern;
-    }
-    ~TempFolder() {
-        std::error_code ignored;
-        fs::remove_all(path, ignored);
-    }
-    TempFolder(const TempFolder&) = delete;
-    TempFolder& operator=(const TempFolder&) = delete;
-
-    fs::path path;
-};
 
 double megabytes(const fs::path& path) {
     std::error_code error;
@@ -670,7 +654,7 @@ int time_one_file(const Options& options) {
 }
 
 int run_all(const Options& options) {
-    TempFolder temp;
+    TempFolder temp("vrx-builder-bench");
     const std::vector<Netlist> netlists = prepare_netlists(options, temp.path);
     long baseline = 0;
     if (options.memory) {

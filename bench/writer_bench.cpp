@@ -28,6 +28,7 @@
 #include "hx_library.h"
 #include "port_file.h"
 #include "port_msg.h"
+#include "temp_folder.h"
 #include "ut_ptrfile.h"
 #include "vrx.h"
 
@@ -40,23 +41,6 @@ constexpr std::size_t kStreamBuffer = 4096;  // the writer's own stream buffer
 double seconds_since(std::chrono::steady_clock::time_point start) {
     return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
 }
-
-/// A fresh folder under $TMPDIR (or /tmp), removed with its files.
-struct TempFolder {
-    TempFolder() {
-        std::string pattern = (fs::temp_directory_path() / "vrx-writer-bench-XXXXXX").string();
-        if (::mkdtemp(pattern.data()) == nullptr) throw std::runtime_error("mkdtemp failed");
-        path = pattern;
-    }
-    ~TempFolder() {
-        std::error_code ignored;
-        fs::remove_all(path, ignored);
-    }
-    TempFolder(const TempFolder&) = delete;
-    TempFolder& operator=(const TempFolder&) = delete;
-
-    std::string path;
-};
 
 /// The converter holding the design, the text it writes, and that text in
 /// lines; made once for both benchmarks.
@@ -126,7 +110,7 @@ struct WriterFixture {
 
     double megabytes() const { return double(text.size()) / 1e6; }
 
-    TempFolder temp;
+    TempFolder temp{"vrx-writer-bench"};
     std::string design_path;
     std::string text_path;
     std::string raw_path;
