@@ -67,8 +67,8 @@ void VRX::do_library_props(VX_PROP_ARRAY* props) {
     }
     const char* device = Hxb_Util::get_string_prop(library, "LOG_PM");
     if (device == nullptr) return;
-    const PM_SPEC spec(nullptr, PM_BIND_DEVICE);
-    if (spec.isvalidpmname(device, 1)) {
+    const PM_SPEC devices(nullptr, PM_BIND_DEVICE);
+    if (devices.isvalidpmname(device, 1)) {
         delete picspec;
         picspec = new PM_PIC(device, nullptr, nullptr);
     } else {
