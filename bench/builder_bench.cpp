@@ -8,6 +8,9 @@
 //                                                 "scaling" for the scaling table)
 //   build/bin/builder_bench --no-memory --no-scaling --reps 1
 //   build/bin/builder_bench --time FILE.vrx       one file: prims and prims/s (bench/peers.sh)
+//   build/bin/builder_bench --tsv                 the figures as tab-separated lines
+//                                                 (bench/run.sh; formats below, "--tsv")
+//   build/bin/builder_bench --scale-max 400000    a shorter scaling series
 //
 // Netlists:
 //   flat1M   gen_vrx.py --gates 1000000: one million AND gates, flat
@@ -16,6 +19,7 @@
 //            merge records, a physical hierarchy with map signals
 //   EPFL circuits (aig2vrx.py), serv, biriscv, picorv32
 //   scaling  gen_hier_vrx.py at 100k, 200k, 400k, 800k and 1.6M primitives
+//            (--scale-max: up to that size)
 // The real netlists and the two scripts come from VRX_NETLISTS (default:
 // ../shared/netlists beside the source tree); without them those rows are
 // skipped with a message. Generated files go to a fresh folder under $TMPDIR
@@ -71,6 +75,8 @@ struct Options {
     bool wall = false;
     bool memory = true;
     bool scaling = true;
+    bool tsv = false;
+    long scale_max = 1'600'000;     // the largest netlist of the scaling series
     std::vector<std::string> only;  // netlist names; empty: all
     std::string time_file;          // --time
 };
@@ -94,7 +100,8 @@ std::vector<std::string> split_commas(const std::string& text) {
 void usage() {
     std::fprintf(stderr,
                  "usage: builder_bench [--reps N] [--wall] [--no-memory] [--no-scaling]\n"
-                 "                     [--only NAME,...] [--time FILE.vrx]\n");
+                 "                     [--scale-max PRIMS] [--only NAME,...] [--tsv]\n"
+                 "                     [--time FILE.vrx]\n");
     std::exit(64);
 }
 
@@ -111,6 +118,10 @@ Options parse_options(int argc, char** argv) {
             options.memory = false;
         } else if (arg == "--no-scaling") {
             options.scaling = false;
+        } else if (arg == "--tsv") {
+            options.tsv = true;
+        } else if (arg == "--scale-max" && has_value) {
+            options.scale_max = std::max(100'000L, std::atol(argv[++i]));
         } else if (arg == "--only" && has_value) {
             options.only = split_commas(argv[++i]);
         } else if (arg == "--time" && has_value) {
@@ -570,7 +581,7 @@ struct ScalePoint {
 std::vector<ScalePoint> measure_scaling(const Options& options, const fs::path& temp) {
     std::vector<ScalePoint> points;
     const fs::path script = fs::path(VRX_BENCH_DIR) / "gen_hier_vrx.py";
-    for (long prims = 100'000; prims <= 1'600'000; prims *= 2) {
+    for (long prims = 100'000; prims <= options.scale_max; prims *= 2) {
         ScalePoint point;
         point.prims_asked = prims;
         const fs::path file = temp / ("hier" + std::to_string(prims) + ".vrx");
@@ -635,6 +646,58 @@ void print_scaling_table(const std::vector<ScalePoint>& points) {
     print_overall_ratio(points);
 }
 
+// --- Tab-separated figures (--tsv) -------------------------------------------------
+//
+// One line per netlist and kind, the raw measurements only (ratios are left
+// to the caller); "-" where a figure is missing:
+//   read   NAME text_MB prims pins lib_pins cold_s warm_s peak_B/pin status
+//   write  NAME written_MB vrx_write_s
+//   files  NAME hxb_MB hxb_read_cold_s hxb_read_warm_s hxb_write_s
+//   scale  PRIMS pins text_MB cold_s warm_s status
+
+void print_tsv_reads(const std::vector<Result>& results, long baseline) {
+    for (const Result& r : results) {
+        const Counts& counts = r.read.counts;
+        const Times& t = r.read.read;
+        if (!read_ok(r.read.status)) {
+            std::printf("read\t%s\t%.3f\t-\t-\t-\t-\t-\t-\t%s\n", r.name.c_str(), r.text_mb,
+                        status_text(r.read.status));
+            continue;
+        }
+        char peak[32] = "-";
+        if (baseline > 0 && counts.lib_pins > 0) {
+            std::snprintf(peak, sizeof peak, "%.2f",
+                          double(r.read.peak_rss - baseline) / double(counts.lib_pins));
+        }
+        std::printf("read\t%s\t%.3f\t%zu\t%zu\t%zu\t%.6f\t%.6f\t%s\t%s\n", r.name.c_str(),
+                    r.text_mb, counts.prims, counts.pins, counts.lib_pins, t.cold, t.warm, peak,
+                    status_text(r.read.status));
+    }
+}
+
+void print_tsv_writes(const std::vector<Result>& results) {
+    for (const Result& r : results) {
+        if (r.write.status != VX_OK) continue;
+        std::printf("write\t%s\t%.3f\t%.6f\n", r.name.c_str(), r.written_mb, r.write.text_write);
+        if (r.db_read.status != VX_OK) continue;
+        std::printf("files\t%s\t%.3f\t%.6f\t%.6f\t%.6f\n", r.name.c_str(), r.db_mb,
+                    r.db_read.read.cold, r.db_read.read.warm, r.write.db_write);
+    }
+}
+
+void print_tsv_scaling(const std::vector<ScalePoint>& points) {
+    for (const ScalePoint& p : points) {
+        if (!read_ok(p.read.status)) {
+            std::printf("scale\t%ld\t-\t%.3f\t-\t-\t%s\n", p.prims_asked, p.text_mb,
+                        status_text(p.read.status));
+            continue;
+        }
+        std::printf("scale\t%zu\t%zu\t%.3f\t%.6f\t%.6f\t%s\n", p.read.counts.prims,
+                    p.read.counts.pins, p.text_mb, p.read.read.cold, p.read.read.warm,
+                    status_text(p.read.status));
+    }
+}
+
 // --- Modes --------------------------------------------------------------------------
 
 /// --time FILE: one line for bench/peers.sh (seconds: the cold read).
@@ -666,6 +729,12 @@ int run_all(const Options& options) {
         results.push_back(measure(netlist, options, temp.path));
     const std::vector<ScalePoint> points =
         options.scaling ? measure_scaling(options, temp.path) : std::vector<ScalePoint>{};
+    if (options.tsv) {
+        print_tsv_reads(results, options.memory ? baseline : 0);
+        print_tsv_writes(results);
+        print_tsv_scaling(points);
+        return 0;
+    }
     print_header(options);
     print_read_table(results, options.memory ? baseline : 0);
     print_write_table(results);

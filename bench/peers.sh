@@ -3,12 +3,15 @@
 # our vrx_read of the VRX form against ABC's and yosys's read_blif of the
 # BLIF form (aig2vrx.py / gen_vrx.py write both from one circuit).
 #
-#   bench/peers.sh [--build-dir DIR] [--reps N] [--wall]
+#   bench/peers.sh [--build-dir DIR] [--reps N] [--wall] [--circuits LIST] [--tsv]
 #
 # Installs Debian's berkeley-abc and yosys packages when they are missing
 # (apt-get; run by hand, never in CI). Needs builder_bench, built in DIR
 # (default: build). Circuits: the largest EPFL circuits and one million
-# generated AND gates; files go to a temporary folder, removed at the end.
+# generated AND gates (syn1M), or those of the comma-separated LIST; files go
+# to a temporary folder, removed at the end. --tsv prints, instead of the
+# table, one line per circuit for bench/run.sh:
+#   peers <TAB> circuit <TAB> prims <TAB> ours <TAB> ABC <TAB> yosys   (prims/s)
 #
 # Speeds are primitives per second, with the primitive count of our database
 # for all three readers. Times are the best of N runs (default 3) in CPU time,
@@ -23,19 +26,25 @@ cd "$(dirname "$0")/.."
 build_dir=build
 reps=3
 wall=0
+tsv=0
+circuits=(hyp mem_ctrl div log2 multiplier sqrt syn1M)
 while (($#)); do
   case "$1" in
     --build-dir) build_dir=$2; shift ;;
     --reps) reps=$2; shift ;;
     --wall) wall=1 ;;
-    *) echo "usage: bench/peers.sh [--build-dir DIR] [--reps N] [--wall]" >&2; exit 64 ;;
+    --tsv) tsv=1 ;;
+    --circuits) IFS=, read -r -a circuits <<<"$2"; shift ;;
+    *)
+      echo "usage: bench/peers.sh [--build-dir DIR] [--reps N] [--wall] [--circuits LIST] [--tsv]" >&2
+      exit 64
+      ;;
   esac
   shift
 done
 
 netlists=${VRX_NETLISTS:-../shared/netlists}
 bench=$build_dir/bin/builder_bench
-circuits=(hyp mem_ctrl div log2 multiplier sqrt)
 
 [[ -x $bench ]] || { echo "peers.sh: $bench not found; build the builder_bench target" >&2; exit 1; }
 [[ -f $netlists/aig2vrx.py ]] || { echo "peers.sh: no netlists in $netlists (set VRX_NETLISTS)" >&2; exit 1; }
@@ -88,23 +97,28 @@ trap 'rm -rf "$work"' EXIT
 
 names=()
 for c in "${circuits[@]}"; do
+  [[ $c == syn1M ]] && continue
   [[ -f $netlists/epfl/$c.aig ]] || { echo "peers.sh: $c.aig not found, skipped" >&2; continue; }
   python3 "$netlists/aig2vrx.py" "$netlists/epfl/$c.aig" -o "$work/$c.vrx"
   python3 "$netlists/aig2vrx.py" "$netlists/epfl/$c.aig" --blif -o "$work/$c.blif"
   names+=("$c")
 done
-echo "generating syn1M ..." >&2
-python3 "$netlists/gen_vrx.py" --gates 1000000 -o "$work/syn1M.vrx"
-python3 "$netlists/gen_vrx.py" --gates 1000000 --blif -o "$work/syn1M.blif"
-names+=(syn1M)
+if [[ " ${circuits[*]} " == *" syn1M "* ]]; then
+  echo "generating syn1M ..." >&2
+  python3 "$netlists/gen_vrx.py" --gates 1000000 -o "$work/syn1M.vrx"
+  python3 "$netlists/gen_vrx.py" --gates 1000000 --blif -o "$work/syn1M.blif"
+  names+=(syn1M)
+fi
 
 abc_start=$(best_of berkeley-abc -c "quit")
 yosys_start=$(best_of yosys -q -p "")
 
-clock=$( ((wall)) && echo "wall-clock" || echo "CPU time, user + system")
-printf 'Reading speed in primitives per second (best of %s runs, %s)\n' "$reps" "$clock"
-printf 'targets: ours >= 3x ABC read_blif, >= 20x yosys read_blif\n\n'
-printf '%-11s %9s %12s %12s %12s %8s %-6s %8s %-6s\n' circuit prims ours ABC yosys "x ABC" "" "x yosys" ""
+if ((!tsv)); then
+  clock=$( ((wall)) && echo "wall-clock" || echo "CPU time, user + system")
+  printf 'Reading speed in primitives per second (best of %s runs, %s)\n' "$reps" "$clock"
+  printf 'targets: ours >= 3x ABC read_blif, >= 20x yosys read_blif\n\n'
+  printf '%-11s %9s %12s %12s %12s %8s %-6s %8s %-6s\n' circuit prims ours ABC yosys "x ABC" "" "x yosys" ""
+fi
 for c in "${names[@]}"; do
   echo "timing $c ..." >&2
   time_flag=()
@@ -114,6 +128,11 @@ for c in "${names[@]}"; do
   ours=$(sed -n 's/.* seconds=\([0-9.]*\) .*/\1/p' <<<"$line")
   abc=$(read_seconds "$(best_of berkeley-abc -c "read_blif $work/$c.blif")" "$abc_start")
   yosys=$(read_seconds "$(best_of yosys -q -p "read_blif $work/$c.blif")" "$yosys_start")
+  if ((tsv)); then
+    awk -v c="$c" -v p="$prims" -v o="$ours" -v a="$abc" -v y="$yosys" \
+      'BEGIN { printf "peers\t%s\t%d\t%.0f\t%.0f\t%.0f\n", c, p, p / o, p / a, p / y }'
+    continue
+  fi
   awk -v c="$c" -v p="$prims" -v o="$ours" -v a="$abc" -v y="$yosys" 'BEGIN {
     ra = a / o; ry = y / o
     printf "%-11s %9d %12.0f %12.0f %12.0f %8.1f %-6s %8.1f %-6s\n", c, p, p / o, p / a, p / y,

@@ -204,6 +204,7 @@ void VRX::begin_grafted_block(HX_DESIGN* source, VX_PROP_ARRAY* props) {
                  vx_text(source->get_name()));
         return;
     }
+    resolve_before_graft(source);
     using PhysInstantiate = HX_PHYSBLOCK* (HX_DESIGN::*)(HX_BASEPHYSBLOCK*, HX_DESIGN*, uint8_t);
     using LogInstantiate = HX_LOGBLOCK* (HX_DESIGN::*)(HX_BASELOGBLOCK*, HX_DESIGN*, uint8_t);
     if (physical)

@@ -1,5 +1,6 @@
 // Merge records become network references once a whole file is read: each
 // MERGEDTO, MERGEDFROM or JOINED names a net that may be declared after it.
+#include <algorithm>
 #include <string>
 #include <vector>
 
@@ -46,6 +47,16 @@ void VRX::resolve_merge_props() {
     lookups->merge_pending_set.clear();
     for (HX_DESIGN* target : pending)
         resolve_design_merges(target);
+}
+
+// A design grafted while its merge records wait would hand the copy names
+// of its own nets, which mean nothing in the target. Its records are
+// resolved first: the copy takes the source as it stands, references and all.
+void VRX::resolve_before_graft(HX_DESIGN* source) {
+    if (!lookups || lookups->merge_pending_set.erase(source) == 0) return;
+    std::vector<HX_DESIGN*>& pending = lookups->merge_pending;
+    pending.erase(std::find(pending.begin(), pending.end(), source));
+    resolve_design_merges(source);
 }
 
 void VRX::resolve_design_merges(HX_DESIGN* target) {

@@ -1,5 +1,5 @@
-// The converter object: construction, copies, the active converter and the
-// signal caches.
+// The converter object: construction, copies, the active converter, the
+// progress hook and the signal caches.
 #include <algorithm>
 
 #include "hxb_propfilter.h"
@@ -7,6 +7,7 @@
 #include "ut_str.h"
 #include "vrx.h"
 #include "vx_builder_internal.h"
+#include "vx_text.h"
 
 VRX* active_vrx = nullptr;
 
@@ -109,8 +110,33 @@ void VRX::copy_from(const VRX& other) {
     design = other.design;
     log_root = other.log_root;
     phys_root = other.phys_root;
+    progress_fn = other.progress_fn;
+    progress_context = other.progress_context;
 }
 
 void VRX::set_parser_status(VX_PARSER_STATUS status) {
     parser_status = status;
+}
+
+// --- progress ----------------------------------------------------------------------
+
+void VRX::set_progress(VX_PROGRESS_FN fn, void* context) {
+    progress_fn = fn;
+    progress_context = context;
+}
+
+void VRX::begin_progress(const char* verb, const char* path) {
+    if (progress_fn == nullptr) return;
+    progress_what = verb;
+    progress_what += ' ';
+    progress_what += vx_text(path);
+}
+
+void VRX::forward_progress(void* self, uint64_t done, uint64_t total) {
+    static_cast<const VRX*>(self)->report_progress(done, total);
+}
+
+void VRX::forward_scan_progress(void* self, uint64_t done) {
+    const auto* vrx = static_cast<const VRX*>(self);
+    vrx->report_progress(done, vrx->progress_total);
 }

@@ -12,6 +12,7 @@
 #include <string>
 #include <unordered_set>
 
+#include "hx_file.h"
 #include "hx_library.h"
 #include "hxb_propfilter.h"
 #include "port_file.h"
@@ -41,6 +42,15 @@ void track_temp(const char* name) {
     (void)hooked;
     pending_temp = name;
 }
+
+// Takes the progress hook back from the database on every way out,
+// exceptions included: it points at the converter.
+struct ProgressHookOff {
+    ProgressHookOff() = default;
+    ProgressHookOff(const ProgressHookOff&) = delete;
+    ProgressHookOff& operator=(const ProgressHookOff&) = delete;
+    ~ProgressHookOff() { HX_FILE_IO::set_progress(nullptr, nullptr); }
+};
 
 // Removes the temporary file and stops tracking it; false when it stays.
 bool remove_temp(const char* temp_name) {
@@ -72,6 +82,9 @@ VX_STATUS VRX::hxb_read(const char* path) {
         return VX_FILE_ERROR;
     }
     VX_STATUS status = VX_OK;
+    begin_progress("reading", path);
+    const ProgressHookOff hook_off;
+    if (progress_fn != nullptr) HX_FILE_IO::set_progress(forward_progress, this);
     switch (hx_env.get_file_type(db_file)) {
         case HX_FILE_DESIGN:
             write_msg(__LINE__).issueStatus("   reading design from '%s' ...\n", path);
@@ -146,9 +159,11 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
         prop_filter = filter.release();
     }
     write_msg(__LINE__).issueStatus("   writing VRX file '%s' ...\n", path);
+    begin_progress("writing", path);
 
     indent = 0;
     column = 0;
+    constructs_written = 0;
     vx_write_reset_fatal();
     write_file_header();
     if (is_design)
@@ -173,6 +188,7 @@ VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
         discard_output(out_stream, temp_name);
         return VX_FILE_ERROR;
     }
+    report_write_progress(temp_name, true);
     if (!Port::File::copy(temp_name, path)) {
         write_msg(__LINE__).issueError("Unable to copy temporary file '%s' to '%s'.\n", temp_name,
                                        path);

@@ -12,9 +12,12 @@
 //  - hxb_write checks the database write and the close; the destination is
 //    replaced only by a complete file.
 #include <cstdio>
+#include <filesystem>
 #include <memory>
 #include <string>
+#include <system_error>
 
+#include "hx_file.h"
 #include "hx_library.h"
 #include "hxb_drc.h"
 #include "port_file.h"
@@ -22,6 +25,7 @@
 #include "ut_path.h"
 #include "ut_str.h"
 #include "vrx.h"
+#include "vrx_scan.h"
 #include "vx_builder_internal.h"
 
 namespace {
@@ -49,6 +53,25 @@ class InputFile {
   private:
     std::FILE* file_;
 };
+
+// Takes the progress hooks back from the reader and the database on every
+// way out, exceptions included: they point at the converter.
+struct ProgressHooksOff {
+    ProgressHooksOff() = default;
+    ProgressHooksOff(const ProgressHooksOff&) = delete;
+    ProgressHooksOff& operator=(const ProgressHooksOff&) = delete;
+    ~ProgressHooksOff() {
+        vrx_set_scan_progress(nullptr, nullptr);
+        HX_FILE_IO::set_progress(nullptr, nullptr);
+    }
+};
+
+// 0 when the size is not known (a pipe, say).
+uint64_t file_size(const char* path) {
+    std::error_code error;
+    const std::uintmax_t size = std::filesystem::file_size(path, error);
+    return error ? 0 : static_cast<uint64_t>(size);
+}
 
 }  // namespace
 
@@ -101,6 +124,10 @@ VX_STATUS VRX::read_one_file(const char* name) {
     read_msg(__LINE__).issueStatus("reading VRX file %s ...\n", path.c_str());
     parser_status = VX_PARSER_OK;
     vrx_parse_init();
+    progress_total = file_size(path.c_str());
+    begin_progress("reading", path.c_str());
+    const ProgressHooksOff hooks_off;
+    if (progress_fn != nullptr) vrx_set_scan_progress(forward_scan_progress, this);
     if (vrx_parse() != 0 || parser_status != VX_PARSER_OK) {
         read_msg(__LINE__).issueError("parse of input file failed\n");
         return VX_PARSE_ERROR;
@@ -178,6 +205,9 @@ VX_STATUS VRX::hxb_write(const char* path) {
         return VX_FILE_ERROR;
     }
     read_msg(__LINE__).issueStatus("writing %s ...\n", out.c_str());
+    begin_progress("writing", out.c_str());
+    const ProgressHooksOff hooks_off;
+    if (progress_fn != nullptr) HX_FILE_IO::set_progress(forward_progress, this);
     const bool written =
         is_design ? hx_env.write_design(db_file, design) : hx_env.write_library(db_file, library);
     if (!written) db_file->fail();  // the database has said why

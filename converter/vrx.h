@@ -14,6 +14,7 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <string>
 #include <string_view>
 
 #include "hx_design.h"
@@ -37,6 +38,24 @@ enum VX_STATUS : int32_t {
     VX_PARSE_ERROR = 2,  // a text file did not parse
     VX_DRC_ERROR = 3,    // the design-rule check after reading found errors
 };
+
+/// The version ("MAJOR.MINOR.PATCH") of the shared library the program runs
+/// with. Defined only in the shared library.
+const char* vrx_library_version();
+
+/// Progress of a long conversion step, for a host that shows it. `what`
+/// names the step and its file ("reading top.vrx", "writing top.hxb") and is
+/// valid during the call only; `done` of `total` counts bytes of that file:
+///  - vrx_read, for each input: bytes read of the file's size;
+///  - vrx_write: bytes of text written so far (`total` 0: not known yet);
+///  - hxb_read: bytes decoded of the file's size, once it is in memory;
+///  - hxb_write: bytes written of the file's size, once it is encoded.
+/// `done` never decreases within a step, and the last report of a step that
+/// completes has `done` equal to `total`. Reports come per chunk of work
+/// (kilobytes of text, thousands of objects), often many a second: the host
+/// decides how often to show them. The hook runs on the converter's thread
+/// inside the conversion call and must not use the converter.
+using VX_PROGRESS_FN = void (*)(void* context, const char* what, uint64_t done, uint64_t total);
 
 /// Signals of the design being read, by name. Entries are non-owning
 /// references to signals of `design`, in which missing signals are made.
@@ -64,12 +83,18 @@ class VRX {
     /// A copy shares the database objects and duplicates what it owns: the
     /// first input name is copied; the file object, the property filter and
     /// the device description stay with the source (the copy has none); the
-    /// signal caches are copied. A copy never becomes the active converter.
+    /// signal caches and the progress hook are copied. A copy never becomes
+    /// the active converter.
     VRX(const VRX& other);
     VRX& operator=(const VRX& other);
 
     HX_DESIGN* get_design() const { return design; }
     HX_LIBRARY* get_library() const { return library; }
+
+    /// Installs the progress hook of the conversions that follow, called
+    /// with `context`; a null `fn` removes it. Without a hook each chunk of
+    /// work costs one test of the pointer.
+    void set_progress(VX_PROGRESS_FN fn, void* context);
 
     // --- Database to text -----------------------------------------------------
 
@@ -124,6 +149,17 @@ class VRX {
 
     void copy_from(const VRX& other);
     void release_owned();
+
+    // Progress reports (see set_progress): the step reported, and the
+    // forwarders of the reader's and the database's own hooks.
+    void begin_progress(const char* verb, const char* path);
+    void report_progress(uint64_t done, uint64_t total) const {
+        if (progress_fn != nullptr)
+            progress_fn(progress_context, progress_what.c_str(), done, total);
+    }
+    void report_write_progress(const char* file, bool complete);
+    static void forward_progress(void* self, uint64_t done, uint64_t total);
+    static void forward_scan_progress(void* self, uint64_t done);
 
     void init_curr_indices(uint16_t value);
     void set_parser_status(VX_PARSER_STATUS status);
@@ -185,6 +221,7 @@ class VRX {
     HX_BLOCK* get_blk(HX_DESIGN* target, const char* name, uint8_t physical_kind);
     void resolve_merge_props();
     void resolve_design_merges(HX_DESIGN* target);
+    void resolve_before_graft(HX_DESIGN* source);
 
     // Database to text: the top of the file and the library.
     void write_file_header();
@@ -243,6 +280,7 @@ class VRX {
 
     // Signals and map signals.
     void write_signal_props(HX_BLOCK* block);
+    std::string section_net_name(const HX_NETWORK* net) const;
     void write_map_signals(HX_BASEPHYSBLOCK* block);
     void write_pin_mapsignal(HX_BASEPHYSBLOCK* block, const HX_PIN* pin, const VX_LEGALNAME& label);
     void write_unmapped_children(HX_BASEPHYSBLOCK* block, std::optional<VX_LEGALNAME>& label);
@@ -264,6 +302,10 @@ class VRX {
     Hxb_PropFilter* prop_filter;
     int32_t column;
     uint8_t omit_user;
+    // The block whose signal statements are being written: a net that a tag
+    // property names is named as seen from its section.
+    const HX_BLOCK* signal_section = nullptr;
+    uint32_t constructs_written = 0;  // counts toward the next progress report
     // Reader state.
     uint8_t make_physroot;
     VX_PARSER_STATUS parser_status;
@@ -285,6 +327,11 @@ class VRX {
     HX_DESIGN* design;
     HX_BASELOGBLOCK* log_root;
     HX_BASEPHYSBLOCK* phys_root;
+    // The progress hook, and the step and file size it reports on.
+    VX_PROGRESS_FN progress_fn = nullptr;
+    void* progress_context = nullptr;
+    std::string progress_what;
+    uint64_t progress_total = 0;
     // Keyed lookups of the builder (blocks and networks by name, designs
     // holding merge records); made on first use, never copied.
     std::unique_ptr<VX_LOOKUPS> lookups;

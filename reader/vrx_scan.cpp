@@ -18,7 +18,8 @@
 // A quote with no closing quote matches none of them: it is copied to standard
 // output and scanning resumes right behind it.
 //
-// Input is read in blocks of up to 8192 bytes into a buffer of 16384 bytes.
+// Input is read in blocks of up to 8192 bytes into a buffer of 16384 bytes;
+// after each block a progress hook, when installed, hears the bytes read.
 // A carriage return right before a line feed is dropped, so CRLF files scan
 // exactly like LF files: it ends a word or number and is skipped with the line
 // feed, and a quoted string's text loses it. Any other CR is a word byte.
@@ -80,11 +81,19 @@ struct Scanner {
     std::FILE* input = nullptr;  // null: standard input
     char* buf = nullptr;         // read-ahead buffer of `size` bytes, null when released
     std::size_t size = 0;
-    char* lim = no_data;   // end of the buffered data; *lim is the NUL sentinel
-    bool stopped = false;  // a fatal stop happened: end of input until a new stream
+    char* lim = no_data;      // end of the buffered data; *lim is the NUL sentinel
+    bool stopped = false;     // a fatal stop happened: end of input until a new stream
+    uint64_t bytes_read = 0;  // from the current input
 };
 
 Scanner sc;
+
+struct ProgressHook {
+    VX_SCAN_PROGRESS_FN fn = nullptr;
+    void* context = nullptr;
+};
+
+ProgressHook progress;
 
 std::FILE* stream() {
     return sc.input ? sc.input : stdin;
@@ -94,7 +103,7 @@ std::FILE* stream() {
 
 void discard_buffer() {
     std::free(sc.buf);
-    sc = Scanner{sc.input, nullptr, 0, no_data, sc.stopped};
+    sc = Scanner{sc.input, nullptr, 0, no_data, sc.stopped, sc.bytes_read};
     vrx_scan_cur = no_data;
 }
 
@@ -149,6 +158,8 @@ std::size_t read_block() {
     }
     sc.lim += got;
     *sc.lim = '\0';
+    sc.bytes_read += got;
+    if (progress.fn != nullptr && got > 0) progress.fn(progress.context, sc.bytes_read);
     return got;
 }
 
@@ -352,6 +363,11 @@ void vrx_set_input(std::FILE* stream) {
     discard_buffer();
     sc.input = stream;
     sc.stopped = false;
+    sc.bytes_read = 0;
+}
+
+void vrx_set_scan_progress(VX_SCAN_PROGRESS_FN fn, void* context) {
+    progress = ProgressHook{fn, context};
 }
 
 namespace {

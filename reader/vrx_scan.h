@@ -1,6 +1,6 @@
 // The reader's private interface between scanner, parser and diagnostics.
 // Not part of the reader's public header: only the reader itself and its
-// tests include it.
+// tests include it, and the converter for the progress hook below.
 //
 // The scanner's common tokens (words, keywords, short numbers, separators, with
 // the blanks and line ends before them) are scanned by the inline
@@ -67,6 +67,13 @@ inline bool vrx_run_ended() {
 }
 /// Called by `vrx_parse` when it starts.
 void vrx_clear_run_ended();
+
+/// Progress of the scan: `bytes_read` bytes read from the current input so
+/// far. Called after every block read from the input (a few kilobytes), never
+/// per token; the count starts again at each `vrx_set_input`.
+using VX_SCAN_PROGRESS_FN = void (*)(void* context, uint64_t bytes_read);
+/// Installs the hook; a null `fn` removes it.
+void vrx_set_scan_progress(VX_SCAN_PROGRESS_FN fn, void* context);
 
 /// The scanner's allocator for its read-ahead buffer, with the semantics of
 /// std::realloc; the scanner releases the buffer with std::free. Tests replace

@@ -1,14 +1,18 @@
 #!/bin/sh
-# Builds the project and converts the bundled example design to text:
-# examples/make_design stores a small design file, hxb2vrx writes it as VRX.
+# Builds the project and runs the main job on the bundled example: the text
+# netlist examples/design.vrx becomes a design file (vrx2hxb), which becomes
+# text again (hxb2vrx); the result is printed.
 set -eu
 cd "$(dirname "$0")/.."
 scripts/install-deps.sh
 cmake -S . -B build-demo -G Ninja -DVRX_BUILD_TESTS=OFF -DVRX_BUILD_BENCH=OFF >/dev/null
-cmake --build build-demo --target make_design hxb2vrx
+cmake --build build-demo --target vrx2hxb hxb2vrx
 out=build-demo/example
 mkdir -p "$out"
-build-demo/bin/make_design "$out/counter.hxb"
-build-demo/bin/hxb2vrx "$out/counter.hxb" "$out/counter.vrx"
 echo
-cat "$out/counter.vrx"
+build-demo/bin/vrx2hxb -o "$out/design.hxb" examples/design.vrx
+build-demo/bin/hxb2vrx "$out/design.hxb" "$out/design.vrx"
+echo
+cat "$out/design.vrx"
+echo
+echo "examples/design.vrx -> $out/design.hxb -> $out/design.vrx"

@@ -5,7 +5,8 @@
 set -euo pipefail
 
 needed=()
-for tool in cmake ninja g++ clang++; do
+# pkg-config and valgrind serve the install and memory-check tests.
+for tool in cmake ninja g++ clang++ pkg-config valgrind; do
   command -v "$tool" >/dev/null 2>&1 || needed+=("$tool")
 done
 [ -f /usr/include/gtest/gtest.h ] || needed+=(libgtest-dev)
@@ -22,6 +23,7 @@ if [ ${#needed[@]} -eq 0 ]; then
 fi
 
 declare -A package_of=([cmake]=cmake [ninja]=ninja-build [g++]=g++ [clang++]=clang
+                       [pkg-config]=pkgconf [valgrind]=valgrind
                        [libgtest-dev]=libgtest-dev
                        [libclang-rt-dev]=libclang-rt-${clang_major:-14}-dev)
 packages=()

@@ -1,37 +1,43 @@
 // hxb2vrx: writes a design (.hxb) or library (.hxl) file as a VRX text netlist.
 //
-//   hxb2vrx [-f FILE | --filter FILE] [-u | --omit-user] INPUT OUTPUT
+//   hxb2vrx [-f FILE | --filter FILE] [-u | --omit-user] [-q | --quiet] INPUT OUTPUT
 //
-// Progress and faults are reported through the message manager's default
-// sink: status lines on standard output, everything else on standard error.
+// Messages go through the message manager's default sink: status lines on
+// standard output, everything else on standard error; -q drops the status
+// lines. On a terminal, standard error also shows the progress of each step
+// (tool_progress.h).
 // The exit status is the VX_STATUS of the first step that failed, 0 when
 // both succeeded, 2 after a fatal report (which ends the run), or 64 for a
 // usage error.
 #include <cstdint>
 
 #include "tool_args.h"
+#include "tool_progress.h"
 #include "vrx.h"
 
 namespace {
 
-enum OptionId { kFilter, kOmitUser };
+enum OptionId { kFilter, kOmitUser, kQuiet };
 
 constexpr vrx_tool::Option kOptions[] = {
     {kFilter, 'f', "filter", true},
     {kOmitUser, 'u', "omit-user", false},
+    {kQuiet, 'q', "quiet", false},
 };
 
 constexpr vrx_tool::ToolInfo kInfo = {
     "hxb2vrx",
     VRX_VERSION,
-    "[-f FILE | --filter FILE] [-u | --omit-user] INPUT OUTPUT",
+    "[-f FILE | --filter FILE] [-u | --omit-user] [-q | --quiet] INPUT OUTPUT",
     "\n"
     "Writes the design (.hxb) or library (.hxl) file INPUT as the VRX text netlist OUTPUT.\n"
-    "OUTPUT is replaced only by a complete file.\n"
+    "OUTPUT is replaced only by a complete file. On a terminal, standard error shows how far\n"
+    "each step has come.\n"
     "\n"
     "Options:\n"
     "  -f, --filter FILE  pass every written property through the property filter FILE\n"
     "  -u, --omit-user    leave the USER flag out of block headers\n"
+    "  -q, --quiet        print neither status lines nor progress; only warnings and errors\n"
     "      --help         print this help and exit\n"
     "      --version      print the version and exit\n"
     "\n"
@@ -47,6 +53,7 @@ constexpr vrx_tool::ToolInfo kInfo = {
 struct Settings {
     const char* filter = nullptr;
     uint8_t omit_user = 0;
+    bool quiet = false;
     const char* input = nullptr;
     const char* output = nullptr;
 };
@@ -61,6 +68,9 @@ Settings settings_from(const vrx_tool::CommandLine& line) {
             case kOmitUser:
                 settings.omit_user = 1;
                 break;
+            case kQuiet:
+                settings.quiet = true;
+                break;
         }
     }
     settings.input = line.operands[0];
@@ -69,10 +79,15 @@ Settings settings_from(const vrx_tool::CommandLine& line) {
 }
 
 int convert(const Settings& settings) {
+    vrx_tool::ProgressLine* progress = vrx_tool::set_up_output(settings.quiet);
     VRX vrx;
-    VX_STATUS status = vrx.hxb_read(settings.input);
-    if (status != VX_OK) return status;
-    return vrx.vrx_write(settings.output, settings.filter, settings.omit_user);
+    if (progress != nullptr) vrx.set_progress(vrx_tool::ProgressLine::report, progress);
+    const VX_STATUS read = vrx.hxb_read(settings.input);
+    if (progress != nullptr) progress->clear();
+    if (read != VX_OK) return read;
+    const VX_STATUS written = vrx.vrx_write(settings.output, settings.filter, settings.omit_user);
+    if (progress != nullptr) progress->clear();
+    return written;
 }
 
 }  // namespace

@@ -2,12 +2,14 @@
 // or library (.hxl) file.
 //
 //   vrx2hxb [-l | --library] [-p | --physroot] [-n | --nograft] [-o FILE | --output FILE]
-//           INPUT...
+//           [-q | --quiet] INPUT...
 //
 // The inputs are read in order into one library. Without -l the last design
-// they define is stored, with -l the whole library. Progress and faults are
-// reported through the message manager's default sink: status lines on
-// standard output, everything else on standard error.
+// they define is stored, with -l the whole library. Messages go through the
+// message manager's default sink: status lines on standard output,
+// everything else on standard error; -q drops the status lines. On a
+// terminal, standard error also shows the progress of each step
+// (tool_progress.h).
 //
 // A file or parse error leaves no database file: what was read is
 // incomplete. A design-rule error does not stop the write (the design is
@@ -19,36 +21,43 @@
 #include <cstdint>
 
 #include "tool_args.h"
+#include "tool_progress.h"
 #include "ut_darray.h"
 #include "vrx.h"
 
 namespace {
 
-enum OptionId { kLibrary, kPhysroot, kNograft, kOutput };
+enum OptionId { kLibrary, kPhysroot, kNograft, kOutput, kQuiet };
 
+// clang-format off
 constexpr vrx_tool::Option kOptions[] = {
     {kLibrary, 'l', "library", false},
     {kPhysroot, 'p', "physroot", false},
     {kNograft, 'n', "nograft", false},
     {kOutput, 'o', "output", true},
+    {kQuiet, 'q', "quiet", false},
 };
+// clang-format on
 
 constexpr vrx_tool::ToolInfo kInfo = {
     "vrx2hxb",
     VRX_VERSION,
-    "[-l | --library] [-p | --physroot] [-n | --nograft] [-o FILE | --output FILE] INPUT...",
+    "[-l | --library] [-p | --physroot] [-n | --nograft] [-o FILE | --output FILE]"
+    " [-q | --quiet] INPUT...",
     "\n"
     "Reads the VRX text netlists INPUT..., in order, into one library and stores the last\n"
     "design they define as a design file (.hxb), or with -l the whole library as a library\n"
     "file (.hxl). An INPUT without an extension is read with \".vrx\" added. The output is\n"
     "named after the first INPUT unless -o names it; its extension is set to .hxb or .hxl.\n"
     "No output is written after a file or parse error; after design-rule errors it is.\n"
+    "On a terminal, standard error shows how far each step has come.\n"
     "\n"
     "Options:\n"
     "  -l, --library      store the whole library instead of the last design\n"
     "  -p, --physroot     derive a physical root for designs whose logical root is PHYSICAL\n"
     "  -n, --nograft      with -l, keep designs from being grafted into each other\n"
     "  -o, --output FILE  write the database file FILE\n"
+    "  -q, --quiet        print neither status lines nor progress; only warnings and errors\n"
     "      --help         print this help and exit\n"
     "      --version      print the version and exit\n"
     "\n"
@@ -67,6 +76,7 @@ struct Settings {
     uint8_t physroot = 0;
     uint8_t nograft = 0;
     const char* output = nullptr;
+    bool quiet = false;
     DARRAY_NAME inputs;
 };
 
@@ -86,6 +96,9 @@ Settings settings_from(const vrx_tool::CommandLine& line) {
             case kOutput:
                 settings.output = option.argument;  // the last one given counts
                 break;
+            case kQuiet:
+                settings.quiet = true;
+                break;
         }
     }
     for (const char* operand : line.operands)
@@ -94,11 +107,15 @@ Settings settings_from(const vrx_tool::CommandLine& line) {
 }
 
 int convert(const Settings& settings) {
+    vrx_tool::ProgressLine* progress = vrx_tool::set_up_output(settings.quiet);
     VRX vrx;
+    if (progress != nullptr) vrx.set_progress(vrx_tool::ProgressLine::report, progress);
     const VX_STATUS read = vrx.vrx_read(settings.inputs, settings.library ? 0 : 1,
                                         settings.physroot, settings.nograft);
+    if (progress != nullptr) progress->clear();
     if (read != VX_OK && read != VX_DRC_ERROR) return read;
     const VX_STATUS written = vrx.hxb_write(settings.output);
+    if (progress != nullptr) progress->clear();
     return read != VX_OK ? read : written;
 }
 

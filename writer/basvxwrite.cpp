@@ -300,6 +300,7 @@ void VRX::write_blkpin_props(const HX_PIN* pin, const HX_BLOCK* block, uint8_t* 
 
 void VRX::write_signal_props(HX_BLOCK* block) {
     const char* keyword = block->is_physical() ? "PHYSSIGNAL" : "SIGNAL";
+    signal_section = block;
     UT_BLIST_ITER<HX_SIGNAL>* globals = block->create_global_siglist(1);
     while (HX_SIGNAL* g = globals->l_next()) {
         write_indent(4, keyword, vrx_legal(g->get_name(), g).view(), "(", "GLOBAL");
@@ -328,6 +329,7 @@ void VRX::write_signal_props(HX_BLOCK* block) {
             write_string("\r\n", nullptr);
     }
     block->delete_signal_iter(signals);
+    signal_section = nullptr;
 }
 
 void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {

@@ -5,6 +5,9 @@
 // texts written together) may reach column 80. Constructs open with " {" and
 // close with "}" on a line of its own, indented three spaces per level.
 //
+// Progress is reported every few thousand constructs closed, as the bytes
+// that reached the file so far; nothing is counted per byte.
+//
 // Names become tokens that read back as the same name: quoted when they are
 // a statement keyword or hold a byte that would end or split a bare word,
 // invented ("OBJ_$" and the object's identity) when absent or empty.
@@ -13,6 +16,8 @@
 #include <climits>
 #include <cstdarg>
 #include <cstring>
+#include <filesystem>
+#include <system_error>
 
 #include "hx_property.h"
 #include "ut_nch_cache.h"
@@ -24,6 +29,9 @@ namespace {
 constexpr int32_t kLineLimit = 79;
 constexpr std::string_view kLineEnd = "\r\n";
 constexpr std::string_view kIndentUnit = "   ";
+// Constructs closed between two progress reports (a power of two): some
+// hundred kilobytes of text.
+constexpr uint32_t kConstructsPerReport = 4096;
 
 // The statement keywords that the writer emits, exact case. Made on first
 // use and kept for the life of the process.
@@ -241,6 +249,18 @@ void VRX::begin_construct() {
 void VRX::end_construct() {
     --indent;
     write_indent(2, "}", "\r\n");
+    if ((++constructs_written & (kConstructsPerReport - 1)) == 0)
+        report_write_progress(out_stream->name(), false);
+}
+
+// The size of `file` is what left the stream's buffer so far; once the file
+// is complete, it is the total too.
+void VRX::report_write_progress(const char* file, bool complete) {
+    if (progress_fn == nullptr) return;
+    std::error_code error;
+    const std::uintmax_t size = std::filesystem::file_size(file, error);
+    if (error) return;
+    report_progress(size, complete ? size : 0);
 }
 
 // --- names -----------------------------------------------------------------------

@@ -48,6 +48,9 @@ void append_float(double value) {
 }  // namespace
 
 void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* block) {
+    // Whether the value is a net's tag goes by the stored name: a filter may
+    // rename the property on its way out.
+    const bool net_tag = names_net_tag(prop->get_name());
     if (prop_filter != nullptr) {
         const HX_PROPERTY* mapped = nullptr;
         prop_filter->map_prop(prop, mapped);
@@ -69,15 +72,16 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
             const int32_t value = prop->get_int();
             begin_text(*opened, token.view());
             prop_text += '=';
-            if (names_net_tag(name)) {
+            if (net_tag) {
                 const HX_NETWORK* net =
-                    design ? hx_find_net_tag(design, static_cast<uint32_t>(value)) : nullptr;
+                    design ? design->follow_net_tag(static_cast<uint32_t>(value)) : nullptr;
                 if (net == nullptr) {
                     vx_write_msg(__LINE__).issueInternal(
                         "No net found for tag in %s=%d property.\n", name, value);
                     return;
                 }
-                prop_text += vrx_legal(net->get_name(), net).view();
+                const std::string local = section_net_name(net);
+                prop_text += vrx_legal(local.empty() ? net->get_name() : local.c_str(), net).view();
             } else {
                 vx_append_int(prop_text, value);
             }
@@ -139,6 +143,32 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
     }
     write_item(prop_text);
     *opened = 1;
+}
+
+// Text is read a section at a time, each as a design of its own, where only
+// the section block's signals are known by name. A net whose highest signal
+// lies outside the section is named after a signal of the section block on
+// it; empty when the net's own name serves (or no such signal exists).
+std::string VRX::section_net_name(const HX_NETWORK* net) const {
+    const HX_BLOCK* section = signal_section;
+    const HX_SIGNAL* highest = net->get_highest_signal();
+    if (section == nullptr || highest == nullptr || highest->is_global() ||
+        highest->get_block() == section)
+        return {};
+    const HX_SIGNAL* local = nullptr;
+    UT_BLIST_ITER<HX_SIGNAL>* members = net->create_signal_iter();
+    while (const HX_SIGNAL* s = members->l_next()) {
+        if (!s->is_global() && s->get_block() == section && s->get_name() != nullptr) {
+            local = s;
+            break;
+        }
+    }
+    net->delete_signal_iter(members);
+    if (local == nullptr) return {};
+    std::string name = section->get_hiername();
+    name += '/';
+    name += local->get_name();
+    return name;
 }
 
 void VRX::write_prop_list(const HX_OBJECT* object, uint8_t* opened, const HX_BLOCK* block) {

@@ -235,4 +235,46 @@ TEST_F(BuilderTest, StatementsWithNothingToActOnAreReported) {
 }
 
 }  // namespace
+// The copy of a design with merge records keeps them as references to its own
+// nets, which the target's pin connections may then join into outer ones.
+TEST_F(BuilderTest, GraftedMergeRecordsFollowTheCopiedNets) {
+    const char* const text =
+        "DESIGN cell {\n"
+        "   BLOCK cell 2 { PIN a (TYPE=IN CONN=a) PIN y (TYPE=OUT CONN=y) }\n"
+        "   PRIM BUF (NAME=b1) { PIN IN (CONN=a) PIN OUT (CONN=m) }\n"
+        "   PRIM BUF (NAME=b2) { PIN IN (CONN=m) PIN OUT (CONN=y) }\n"
+        "   SIGNAL m (MERGEDTO=cell/y)\n"
+        "}\n"
+        "DESIGN top {\n"
+        "   BLOCK top 2 { PIN i (TYPE=IN CONN=i) PIN o (TYPE=OUT CONN=o) }\n"
+        "   BLOCK cell (NAME=u1) { PIN a (CONN=i) PIN y (CONN=o) }\n"
+        "}\n";
+    ASSERT_EQ(read(text, 0), VX_OK);
+    EXPECT_FALSE(has_merge_records(vrx.get_library()));
+    HX_DESIGN* top = design_named(vrx.get_library(), "top");
+    HX_NETWORK* m = net_named(top, "top/u1/m");
+    HX_NETWORK* o = net_named(top, "top/o");
+    ASSERT_TRUE(m && o);
+    ASSERT_EQ(prop_names(m), "MERGEDTO ");
+    // The copy of cell/y was joined into top/o; its tag leads there.
+    EXPECT_EQ(top->follow_net_tag(static_cast<uint32_t>(m->find_prop("MERGEDTO")->get_int())), o);
+    EXPECT_TRUE(own_texts(PORT_MSG_WARNING).empty());
+
+    // Written as text, the copy's section names the net by its own signal,
+    // so that the record reads back to the same net.
+    ASSERT_EQ(read(text, 1), VX_OK);
+    const std::string written = dir.file("out.vrx");
+    ASSERT_EQ(vrx.vrx_write(written.c_str(), nullptr, 0), VX_OK);
+    EXPECT_NE(ScratchDir::read_file(written).find("SIGNAL m (MERGEDTO=top/u1/y)"),
+              std::string::npos);
+    capture.clear();
+    ASSERT_EQ(vrx.vrx_read(written.c_str(), 1, 0, 0), VX_OK);
+    EXPECT_TRUE(own_texts(PORT_MSG_WARNING).empty());
+    HX_NETWORK* m_again = net_named(design(), "top/u1/m");
+    ASSERT_NE(m_again, nullptr);
+    EXPECT_EQ(
+        design()->follow_net_tag(static_cast<uint32_t>(m_again->find_prop("MERGEDTO")->get_int())),
+        net_named(design(), "top/o"));
+}
+
 }  // namespace builder_test

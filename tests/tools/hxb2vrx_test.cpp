@@ -120,8 +120,8 @@ TEST_F(Hxb2vrxTest, UsageErrorsExit64WithUsageOnStandardError) {
         const ToolRun r = run(args);
         EXPECT_EQ(r.status, 64);
         EXPECT_EQ(r.out, "");
-        EXPECT_NE(r.err.find("usage: hxb2vrx [-f FILE | --filter FILE] [-u | --omit-user] INPUT "
-                             "OUTPUT\n"),
+        EXPECT_NE(r.err.find("usage: hxb2vrx [-f FILE | --filter FILE] [-u | --omit-user] "
+                             "[-q | --quiet] INPUT OUTPUT\n"),
                   std::string::npos)
             << r.err;
         EXPECT_EQ(r.err.rfind("hxb2vrx: ", 0), 0u) << r.err;
@@ -134,7 +134,8 @@ TEST_F(Hxb2vrxTest, HelpAndVersionGoToStandardOutputAndExit0) {
     EXPECT_EQ(help.status, 0);
     EXPECT_EQ(help.err, "");
     EXPECT_EQ(help.out.rfind("usage: hxb2vrx ", 0), 0u) << help.out;
-    for (const char* word : {"--filter", "--omit-user", "--version", "Exit status", "64"}) {
+    for (const char* word :
+         {"--filter", "--omit-user", "--quiet", "--version", "Exit status", "64"}) {
         EXPECT_NE(help.out.find(word), std::string::npos) << word;
     }
 

@@ -141,7 +141,7 @@ TEST_F(Vrx2hxbTest, UsageErrorsExit64WithUsageOnStandardError) {
         EXPECT_EQ(r.out, "");
         EXPECT_EQ(r.err.rfind("vrx2hxb: ", 0), 0u) << r.err;
         EXPECT_NE(r.err.find("usage: vrx2hxb [-l | --library] [-p | --physroot] [-n | --nograft] "
-                             "[-o FILE | --output FILE] INPUT...\n"),
+                             "[-o FILE | --output FILE] [-q | --quiet] INPUT...\n"),
                   std::string::npos)
             << r.err;
     }
@@ -153,8 +153,8 @@ TEST_F(Vrx2hxbTest, HelpAndVersionGoToStandardOutputAndExit0) {
     EXPECT_EQ(help.status, 0);
     EXPECT_EQ(help.err, "");
     EXPECT_EQ(help.out.rfind("usage: vrx2hxb ", 0), 0u) << help.out;
-    for (const char* word :
-         {"--library", "--physroot", "--nograft", "--output", "Exit status", "  3 ", "64"}) {
+    for (const char* word : {"--library", "--physroot", "--nograft", "--output", "--quiet",
+                             "Exit status", "  3 ", "64"}) {
         EXPECT_NE(help.out.find(word), std::string::npos) << word;
     }
     const ToolRun version = run({"--version"});

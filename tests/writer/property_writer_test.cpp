@@ -118,7 +118,7 @@ TEST_F(PropertyWriterTest, UnknownKindIsFatalAndTheExitHandlerMayReturn) {
 
 TEST_F(PropertyWriterTest, FilterRenamesAndDrops) {
     const std::string rules = dir.file("rules.flt");
-    ScratchDir::write_file(rules, "DROP\nOLD=NEW\n");
+    ScratchDir::write_file(rules, "DROP\nOLD=NEW\nMERGED*=HIST_*\n");
     Hxb_PropFiltStatus status = HXB_PROPFILT_NOT_READ;
     A::prop_filter(vrx) =
         new Hxb_PropFilter(rules.c_str(), &status, nullptr, Hxb_PropFilter::FROM_DATABASE);
@@ -127,6 +127,12 @@ TEST_F(PropertyWriterTest, FilterRenamesAndDrops) {
     object.create_prop("OLD", "v w", 1);
     object.create_prop("KEEP", 3);
     EXPECT_EQ(props(object), R"( (NEW="v w" KEEP=3)");
+    // A renamed tag property still names its net, not the net's number.
+    HX_OBJECT merged;
+    merged.create_prop(
+        "MERGEDTO",
+        static_cast<int32_t>(design->create_global_signal("g")->get_network()->get_tag()));
+    EXPECT_EQ(props(merged), " (HIST_TO=g");
     HX_OBJECT dropped;
     dropped.create_prop("DROP", HX_PROP_FLAG);
     EXPECT_EQ(props(dropped), "");

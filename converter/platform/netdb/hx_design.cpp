@@ -668,6 +668,25 @@ HX_NETWORK* HX_DESIGN::find_net_tag(uint32_t tag) const {
     return store_->tags.find(tag);
 }
 
+// Dropped tags are never handed out again (new tags rise past them), so a
+// chain of joins ends at a live network or at a tag nothing took over.
+HX_NETWORK* HX_DESIGN::follow_net_tag(uint32_t tag) const {
+    HX_DESIGN_STORAGE& store = *store_;
+    if (HX_NETWORK* net = store.tags.find(tag)) return net;
+    if (store.joined_tags.empty()) return nullptr;
+    for (; store.joined_indexed < store.joined_tags.size(); ++store.joined_indexed) {
+        const auto& [gone, kept] = store.joined_tags[store.joined_indexed];
+        store.joined_index[gone] = kept;
+    }
+    for (std::size_t step = 0; step < store.joined_tags.size(); ++step) {
+        auto next = store.joined_index.find(tag);
+        if (next == store.joined_index.end()) return nullptr;
+        tag = next->second;
+        if (HX_NETWORK* net = store.tags.find(tag)) return net;
+    }
+    return nullptr;
+}
+
 HX_NETWORK* hx_find_net_tag(const HX_DESIGN* design, uint32_t tag) {
     return design ? design->find_net_tag(tag) : nullptr;
 }
@@ -696,6 +715,7 @@ void HX_DESIGN::join_networks(HX_NETWORK* a, HX_NETWORK* b) {
     keep->last_member_ = gone->last_member_;
     keep->members_ += gone->members_;
     keep->copy_properties(gone->get_props(), 0);
+    store_->joined_tags.emplace_back(gone->tag_, keep->tag_);
     drop_network(gone);
 }
 

@@ -479,6 +479,10 @@ class HX_DESIGN : public HX_OBJECT {
     void delete_mapsignal_iter(UT_BLIST_ITER<HX_MAPSIGNAL>* iter) const { delete iter; }
 
     HX_NETWORK* find_net_tag(uint32_t tag) const;
+    /// The network a tag property (MERGEDTO, MERGEDFROM, JOINED) names: the
+    /// network with that tag, or, when that one was since joined into
+    /// another, the network that took it over.
+    HX_NETWORK* follow_net_tag(uint32_t tag) const;
     size_t block_count() const { return blocks_.size(); }
     /// The block made `position`-th (0 first), or null past the last.
     HX_BLOCK* block_at(size_t position) const {

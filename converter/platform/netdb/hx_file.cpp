@@ -334,7 +334,27 @@ void store_le(char* p, T v) {
         p[i] = static_cast<char>(v >> (8 * i));
 }
 
+// --- progress --------------------------------------------------------------------
+
+struct ProgressHook {
+    HX_FILE_PROGRESS_FN fn = nullptr;
+    void* context = nullptr;
+
+    void report(uint64_t done, uint64_t total) const {
+        if (fn != nullptr) fn(context, done, total);
+    }
+};
+
+ProgressHook progress_hook;
+
+// Records decoded between two progress reports: a few milliseconds' work.
+constexpr uint32_t kRecordsPerReport = 65536;
+
 }  // namespace
+
+void HX_FILE_IO::set_progress(HX_FILE_PROGRESS_FN fn, void* context) {
+    progress_hook = ProgressHook{fn, context};
+}
 
 uint32_t HX_FILE_IO::checksum(const void* data, std::size_t size, uint32_t crc) {
     const auto* p = static_cast<const uint8_t*>(data);
@@ -501,6 +521,9 @@ class HX_FILE_IO::Encoder {
         property_section();
     }
 
+    /// Bytes of the whole file, header included.
+    std::size_t file_size() const { return kHeaderSize + out_.size(); }
+
     /// Calls `sink(data, size)` for the header and then each piece of the
     /// body; false stops.
     template <class Sink>
@@ -538,6 +561,7 @@ class HX_FILE_IO::Encoder {
     uint8_t note_props(const HX_OBJECT& object) {
         if (object.prop_count() == 0) return 0;
         with_props_.push_back(&object);
+        props_design_.push_back(lists_.empty() ? nullptr : lists_.back().design);
         return kProps;
     }
 
@@ -761,23 +785,32 @@ class HX_FILE_IO::Encoder {
     }
 
     void property_section() {
-        for (const HX_OBJECT* object : with_props_) {
-            const HX_PROPLIST* list = object->get_props();
+        for (std::size_t k = 0; k < with_props_.size(); ++k) {
+            const HX_PROPLIST* list = with_props_[k]->get_props();
             out_.u32(static_cast<uint32_t>(list->count()));
             for (const HX_PROPERTY* prop : list->items()) {
-                if (prop != nullptr) property(*prop);
+                if (prop != nullptr) property(*prop, props_design_[k]);
             }
         }
     }
 
-    void property(const HX_PROPERTY& prop) {
+    /// A tag property is stored with the tag of the network it names now:
+    /// the one it was given may belong to a network since joined away.
+    static uint32_t int_value(const HX_PROPERTY& prop, const HX_DESIGN* design) {
+        const auto value = static_cast<uint32_t>(prop.get_int());
+        if (design == nullptr || !prop.names_network_tag()) return value;
+        const HX_NETWORK* net = design->follow_net_tag(value);
+        return net != nullptr ? net->tag_ : value;
+    }
+
+    void property(const HX_PROPERTY& prop, const HX_DESIGN* design) {
         out_.text(prop.get_name());
         out_.u8(static_cast<uint8_t>(prop.get_kind()));
         HX_PROP_PINREF_DATA record;
         HX_PROP_TIMING_DATA timing;
         switch (prop.get_kind()) {
             case HX_PROP_INT:
-                out_.u32(static_cast<uint32_t>(prop.get_int()));
+                out_.u32(int_value(prop, design));
                 break;
             case HX_PROP_FLOAT: {
                 const double value = prop.get_float();
@@ -861,9 +894,10 @@ class HX_FILE_IO::Encoder {
     std::vector<const HX_DESIGN*> designs_;
     std::vector<DesignLists> lists_;
     std::vector<const HX_OBJECT*> with_props_;
-    BigVector<uint32_t> net_index_;  // design's network slot -> file position
-    BigVector<uint32_t> highest_;    // file network -> its highest signal
-    BigVector<uint32_t> owners_;     // file signal -> its block's position + 1, or 0
+    std::vector<const HX_DESIGN*> props_design_;  // the design of each, null for a library
+    BigVector<uint32_t> net_index_;               // design's network slot -> file position
+    BigVector<uint32_t> highest_;                 // file network -> its highest signal
+    BigVector<uint32_t> owners_;                  // file signal -> its block's position + 1, or 0
     uint32_t names_key_ = kAbsent;
     std::vector<const char*> pin_names_;
     std::unordered_map<const void*, ObjectRef> refs_;
@@ -886,7 +920,7 @@ std::string HX_FILE_IO::encode(const HX_LIBRARY& library) {
 
 class HX_FILE_IO::Decoder {
   public:
-    Decoder(const uint8_t* body, std::size_t size) : p_(body), end_(body + size) {}
+    Decoder(const uint8_t* body, std::size_t size) : p_(body), end_(body + size), begin_(body) {}
 
     std::unique_ptr<HX_LIBRARY> design_file() {
         const char* name = peek_design_name();
@@ -894,6 +928,7 @@ class HX_FILE_IO::Decoder {
         design_record();
         property_section();
         expect_end();
+        report_progress();
         return std::move(library_);
     }
 
@@ -911,6 +946,7 @@ class HX_FILE_IO::Decoder {
         aliases();
         property_section();
         expect_end();
+        report_progress();
         return std::move(library_);
     }
 
@@ -975,6 +1011,23 @@ class HX_FILE_IO::Decoder {
         if (p_ != end_) corrupt("bytes after the content");
     }
 
+    /// Bytes of the file (its header included) decoded so far.
+    void report_progress() const {
+        progress_hook.report(kHeaderSize + static_cast<uint64_t>(p_ - begin_),
+                             kHeaderSize + static_cast<uint64_t>(end_ - begin_));
+    }
+
+    /// Calls `record` `n` times, with a progress report after each chunk.
+    template <class Record>
+    void in_chunks(uint32_t n, Record record) {
+        for (uint32_t i = 0; i < n;) {
+            const uint32_t chunk_end = n - i > kRecordsPerReport ? i + kRecordsPerReport : n;
+            for (; i < chunk_end; ++i)
+                record(i);
+            report_progress();
+        }
+    }
+
     void note_props(uint8_t flags, HX_OBJECT* object) {
         if (flags & kProps) with_props_.push_back(object);
     }
@@ -1000,8 +1053,7 @@ class HX_FILE_IO::Decoder {
         const uint32_t n = count(kMinBlock);
         objects.blocks.reserve(n);
         objects.block_depth.reserve(n);
-        for (uint32_t i = 0; i < n; ++i)
-            block_record(objects);
+        in_chunks(n, [&](uint32_t) { block_record(objects); });
     }
 
     void block_record(DesignObjects& objects) {
@@ -1072,8 +1124,7 @@ class HX_FILE_IO::Decoder {
         ahead_ = Ahead(p_, end_, n);
         for (uint32_t i = 0; i < Ahead::kDistance; ++i)
             ahead_.step(objects.blocks);
-        for (uint32_t i = 0; i < n; ++i)
-            signal_record(objects);
+        in_chunks(n, [&](uint32_t) { signal_record(objects); });
     }
 
     /// Reads connections ahead of the decoder and asks for what making them
@@ -1222,7 +1273,7 @@ class HX_FILE_IO::Decoder {
         objects.networks.reserve(n);
         std::vector<uint32_t> top(n);
         std::vector<uint32_t> tags(n);
-        for (uint32_t k = 0; k < n; ++k) {
+        in_chunks(n, [&](uint32_t k) {
             tags[k] = u32();
             top[k] = u32();
             const uint8_t flags = u8();
@@ -1235,7 +1286,7 @@ class HX_FILE_IO::Decoder {
             net->highest_ = objects.signals[top[k]];
             note_props(flags, net);
             objects.networks.push_back(net);
-        }
+        });
         check_highest(objects, top);
         objects.design->networks_ = objects.networks;
         retag(*objects.design, objects.networks, tags);
@@ -1317,13 +1368,14 @@ class HX_FILE_IO::Decoder {
     }
 
     void property_section() {
-        for (HX_OBJECT* object : with_props_) {
+        in_chunks(static_cast<uint32_t>(with_props_.size()), [&](uint32_t k) {
+            HX_OBJECT* object = with_props_[k];
             const uint32_t n = count(kMinProp);
             if (n == 0) corrupt("an empty property list");
             for (uint32_t i = 0; i < n; ++i)
                 object->create_prop(property(), nullptr);
             if (object->prop_count() != static_cast<int>(n)) corrupt("a property name repeats");
-        }
+        });
     }
 
     std::unique_ptr<HX_PROPERTY> property() {
@@ -1425,6 +1477,7 @@ class HX_FILE_IO::Decoder {
 
     const uint8_t* p_;
     const uint8_t* end_;
+    const uint8_t* begin_;
     std::unique_ptr<HX_LIBRARY> library_;
     std::vector<DesignObjects> designs_;
     std::vector<HX_OBJECT*> with_props_;
@@ -1650,7 +1703,14 @@ bool HX_FILE_IO::writable(const UT_PTRFILE* file) {
 }
 
 bool HX_FILE_IO::write(UT_PTRFILE* file, Encoder& encoder) {
-    encoder.pieces([&](const char* data, std::size_t size) { return file->write(data, size); });
+    const uint64_t total = encoder.file_size();
+    uint64_t done = 0;
+    encoder.pieces([&](const char* data, std::size_t size) {
+        if (!file->write(data, size)) return false;
+        done += size;
+        progress_hook.report(done, total);
+        return true;
+    });
     if (!file->failed()) return true;
     file->fail();
     return false;

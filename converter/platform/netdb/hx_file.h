@@ -62,6 +62,12 @@
 // belong to the reader until everything has been read. Every count is
 // checked against the bytes left before anything is allocated, so memory
 // stays within a small multiple of the file's size.
+//
+// A progress callback, when installed, hears how far a read or write has
+// come, in bytes of the file: a read reports the bytes decoded once the file
+// is in memory, a write the bytes handed to the file once they are encoded.
+// Reports come per chunk (thousands of records, or megabytes), never per
+// record, and `done` never decreases within one read or write.
 #pragma once
 
 #include <cstddef>
@@ -74,6 +80,9 @@
 class HX_DESIGN;
 class HX_LIBRARY;
 class UT_PTRFILE;
+
+/// `done` of `total` bytes of the file being read or written.
+using HX_FILE_PROGRESS_FN = void (*)(void* context, uint64_t done, uint64_t total);
 
 class HX_FILE_IO {
   public:
@@ -103,6 +112,10 @@ class HX_FILE_IO {
     static std::unique_ptr<HX_LIBRARY> read(UT_PTRFILE* file, HX_FILE_TYPE expected, bool quiet);
     static bool write(UT_PTRFILE* file, const HX_DESIGN& design);
     static bool write(UT_PTRFILE* file, const HX_LIBRARY& library);
+
+    /// Installs the process-wide progress callback, heard by decode (and so
+    /// read) and write; a null `fn` removes it.
+    static void set_progress(HX_FILE_PROGRESS_FN fn, void* context);
 
   private:
     class ConnBatch;

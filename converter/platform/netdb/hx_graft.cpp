@@ -16,13 +16,6 @@ bool same_text(const char* a, const char* b) {
     return std::strcmp(a, b) == 0;
 }
 
-bool is_tag_prop(const HX_PROPERTY* prop) {
-    const char* name = prop->get_name();
-    return prop->get_kind() == HX_PROP_INT &&
-           (std::strcmp(name, "MERGEDTO") == 0 || std::strcmp(name, "MERGEDFROM") == 0 ||
-            std::strcmp(name, "JOINED") == 0);
-}
-
 /// Source objects to their copies: open addressing over pointer keys
 /// (linear probing, at most half full, nothing removed). A graft maps every
 /// block and signal it copies, so this is leaner and quicker than a map
@@ -285,8 +278,12 @@ void HX_GRAFT::copy_network_props() {
             if (prop == nullptr || to->find_prop(prop->get_name()) != nullptr) continue;
             HX_PROPERTY* copy = to->create_prop(prop, nullptr);
             // Tag properties name networks of the source; point them at the copies.
-            if (!is_tag_prop(copy)) continue;
-            auto found = tags.find(static_cast<uint32_t>(copy->get_int()));
+            if (!copy->names_network_tag()) continue;
+            // A tag of a network joined away in the source stands for the survivor.
+            const HX_NETWORK* named =
+                source_.follow_net_tag(static_cast<uint32_t>(copy->get_int()));
+            if (named == nullptr) continue;
+            auto found = tags.find(named->get_tag());
             if (found != tags.end()) copy->set_int(static_cast<int32_t>(found->second));
         }
     }

@@ -329,3 +329,10 @@ UT_BLISTS_ITER<HX_PROPERTY>* HX_OBJECT::create_prop_iter() const {
 void HX_OBJECT::delete_prop_iter(UT_BLISTS_ITER<HX_PROPERTY>* iter) const {
     if (iter != nullptr && props_ != nullptr) props_->delete_iter(iter);
 }
+
+bool HX_PROPERTY::names_network_tag() const {
+    const char* name = get_name();
+    return kind_ == HX_PROP_INT &&
+           (std::strcmp(name, "MERGEDTO") == 0 || std::strcmp(name, "MERGEDFROM") == 0 ||
+            std::strcmp(name, "JOINED") == 0);
+}

@@ -39,6 +39,9 @@ class HX_PROPERTY {
 
     const char* get_name() const { return name_.c_str(); }
     HX_PROP_TYPE get_kind() const { return kind_; }
+    /// True for the integer properties that hold a network's tag:
+    /// MERGEDTO, MERGEDFROM and JOINED.
+    bool names_network_tag() const;
 
     /// Value readers. Each fills or returns the value when the kind suits it
     /// (true / the value) and leaves the record untouched otherwise (false).

@@ -9,6 +9,7 @@
 #include <memory>
 #include <string_view>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 class HX_BLOCK;
@@ -208,4 +209,9 @@ struct HX_DESIGN_STORAGE {
     HX_TAG_TABLE<> tags;
     std::unordered_map<const HX_BLOCK*, HX_PIN_NAME_INDEX> pin_names;
     void* spare_networks = nullptr;  // dropped networks' memory, chained through it
+    // Each join's dropped tag and the tag that took it over, in join order,
+    // and an index of the first `joined_indexed` of them, made when asked.
+    std::vector<std::pair<uint32_t, uint32_t>> joined_tags;
+    std::unordered_map<uint32_t, uint32_t> joined_index;
+    std::size_t joined_indexed = 0;
 };

@@ -308,6 +308,40 @@ TEST(HxFile, NetworkTagsOrderAndHighestSignalsSurvive) {
               copy->create_signal(copy->get_log_root(), "n")->get_network()->get_tag());
 }
 
+// A tag property naming a network that a join then took over follows it to
+// the surviving network, in memory, through a graft and in the file.
+TEST(HxFile, TagPropertiesFollowJoinedNetworks) {
+    ScopedLibrary source(hx_env.create_library("joins", 0));
+    HX_DESIGN* d = source.get()->create_design("top");
+    HX_LOGBLOCK* top = d->create_logblock(nullptr, 0, "top");
+    HX_LOGBLOCK* u1 = d->create_logblock(top, 1, "u1");
+    HX_SIGNAL* inner = d->create_signal(u1, "y");
+    HX_SIGNAL* outer = d->create_signal(top, "o");
+    HX_SIGNAL* m = d->create_signal(u1, "m");
+    const uint32_t joined_tag = inner->get_network()->get_tag();
+    m->get_network()->create_prop("MERGEDTO", static_cast<int32_t>(joined_tag));
+    d->create_conn(inner, u1, 0);
+    d->create_conn(outer, u1, 0);  // y's network joins o's, which survives
+    ASSERT_EQ(d->find_net_tag(joined_tag), nullptr);
+    ASSERT_EQ(d->follow_net_tag(joined_tag), outer->get_network());
+
+    const std::string bytes = HX_FILE_IO::encode(*d);
+    std::string reason;
+    auto read = HX_FILE_IO::decode(bytes.data(), bytes.size(), HX_FILE_DESIGN, reason);
+    ASSERT_NE(read, nullptr) << reason;
+    HX_DESIGN* copy = only_design(*read);
+    HX_NETWORK* m_again = nullptr;
+    for (uint32_t tag = 0; tag <= 4; ++tag) {
+        HX_NETWORK* net = copy->find_net_tag(tag);
+        if (net != nullptr && std::strcmp(net->get_name(), "top/u1/m") == 0) m_again = net;
+    }
+    ASSERT_NE(m_again, nullptr);
+    const HX_NETWORK* named =
+        copy->find_net_tag(static_cast<uint32_t>(m_again->find_prop("MERGEDTO")->get_int()));
+    ASSERT_NE(named, nullptr);
+    EXPECT_STREQ(named->get_name(), "top/o");
+}
+
 TEST(HxFile, FileTypeIsToldFromTheHeaderAndTheFileCanStillBeRead) {
     ScratchDir dir;
     SourceDesign source(3, small_options());

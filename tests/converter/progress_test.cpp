@@ -1,0 +1,117 @@
+// The converter's progress hook over the four conversions, on a netlist large
+// enough for many chunks of each.
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "msg_capture.h"
+#include "scratch_dir.h"
+#include "vrx.h"
+
+namespace {
+
+struct Report {
+    std::string what;
+    uint64_t done;
+    uint64_t total;
+};
+
+void record(void* reports, const char* what, uint64_t done, uint64_t total) {
+    static_cast<std::vector<Report>*>(reports)->push_back({what, done, total});
+}
+
+// A chain of AND gates, about 80 bytes of text and 70 of database file each:
+// 150,000 make several chunks of every step.
+std::string chain_netlist(int gates) {
+    std::string text =
+        "DESIGN chain {\n   BLOCK chain 2 (NAME=chain) {\n"
+        "      PIN a (TYPE=IN CONN=n0)\n";
+    text += "      PIN y (TYPE=OUT CONN=n" + std::to_string(gates) + ")\n   }\n";
+    for (int i = 0; i < gates; ++i) {
+        text += "   PRIM AND 2 { PIN IN (CONN=n" + std::to_string(i) + ") PIN IN (CONN=n0) ";
+        text += "PIN OUT (CONN=n" + std::to_string(i + 1) + ") }\n";
+    }
+    return text + "}\n";
+}
+
+/// One step's reports, taken: all on `verb` and `path`, at least
+/// `min_count`, `done` never decreasing, the last complete at the file's size.
+void expect_step(std::vector<Report>& reports, const char* verb, const std::string& path,
+                 std::size_t min_count) {
+    SCOPED_TRACE(path);
+    const uint64_t size = ScratchDir::read_file(path).size();
+    ASSERT_GE(reports.size(), min_count);
+    for (std::size_t i = 0; i < reports.size(); ++i) {
+        EXPECT_EQ(reports[i].what, verb + (" " + path)) << i;
+        EXPECT_GE(reports[i].done, i > 0 ? reports[i - 1].done : 0) << i;
+        EXPECT_LE(reports[i].done, reports[i].total != 0 ? reports[i].total : size) << i;
+    }
+    EXPECT_EQ(reports.back().done, size);
+    EXPECT_EQ(reports.back().total, size);
+    reports.clear();
+}
+
+class ProgressTest : public ::testing::Test {
+  protected:
+    static void SetUpTestSuite() {
+        dir_ = new ScratchDir;
+        ScratchDir::write_file(dir_->file("chain.vrx"), chain_netlist(150'000));
+    }
+    static void TearDownTestSuite() {
+        delete dir_;
+        dir_ = nullptr;
+    }
+
+    static ScratchDir* dir_;
+    MsgCapture capture_;  // keeps status lines out of the test's output
+    std::vector<Report> reports_;
+};
+
+ScratchDir* ProgressTest::dir_ = nullptr;
+
+TEST_F(ProgressTest, EachConversionReportsBytesUpToTheFileSize) {
+    const std::string text = dir_->file("chain.vrx");
+    const std::string db = dir_->file("chain.hxb");
+    const std::string back = dir_->file("back.vrx");
+    {
+        VRX vrx;
+        vrx.set_progress(record, &reports_);
+        ASSERT_EQ(vrx.vrx_read(text.c_str(), 1, 0, 0), VX_OK);
+        expect_step(reports_, "reading", text, 10);
+        ASSERT_EQ(vrx.hxb_write(db.c_str()), VX_OK);
+        expect_step(reports_, "writing", db, 3);
+    }
+    VRX vrx;
+    vrx.set_progress(record, &reports_);
+    ASSERT_EQ(vrx.hxb_read(db.c_str()), VX_OK);
+    expect_step(reports_, "reading", db, 4);
+    ASSERT_EQ(vrx.vrx_write(back.c_str(), nullptr, 0), VX_OK);
+    expect_step(reports_, "writing", back, 10);
+}
+
+// The reader's and the database's hooks must end with the conversion that
+// installed them: here they would reach a converter that is gone.
+TEST_F(ProgressTest, HooksEndWithTheirConversion) {
+    const std::string text = dir_->file("small.vrx");
+    const std::string db = dir_->file("small.hxb");
+    ScratchDir::write_file(text, chain_netlist(100));
+    {
+        VRX vrx;
+        vrx.set_progress(record, &reports_);
+        ASSERT_EQ(vrx.vrx_read(text.c_str(), 1, 0, 0), VX_OK);
+        ASSERT_EQ(vrx.hxb_write(db.c_str()), VX_OK);
+        ASSERT_FALSE(reports_.empty());
+    }
+    reports_.clear();
+    VRX vrx;
+    vrx.set_progress(record, &reports_);
+    vrx.set_progress(nullptr, &reports_);
+    ASSERT_EQ(vrx.vrx_read(text.c_str(), 1, 0, 0), VX_OK);
+    ASSERT_EQ(vrx.hxb_write(db.c_str()), VX_OK);
+    ASSERT_EQ(vrx.hxb_read(db.c_str()), VX_OK);
+    EXPECT_TRUE(reports_.empty());
+}
+
+}  // namespace
