@@ -164,6 +164,8 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
     indent = 0;
     column = 0;
     constructs_written = 0;
+    unreadable_names = 0;
+    first_unreadable.clear();
     vx_write_reset_fatal();
     write_file_header();
     if (is_design)
@@ -189,6 +191,12 @@ VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
         return VX_FILE_ERROR;
     }
     report_write_progress(temp_name, true);
+    if (unreadable_names > 0) {
+        write_msg(__LINE__).issueWarning(
+            "%u name(s) in '%s' will not read back as written (a double quote, a carriage "
+            "return before a line feed, or more than 1024 bytes), the first '%.80s'\n",
+            unreadable_names, path, first_unreadable.c_str());
+    }
     if (!Port::File::copy(temp_name, path)) {
         write_msg(__LINE__).issueError("Unable to copy temporary file '%s' to '%s'.\n", temp_name,
                                        path);

@@ -249,6 +249,7 @@ class VRX {
     void end_construct();
     VX_LEGALNAME quote_kwd(const char* name);
     VX_LEGALNAME vrx_legal(const char* name, const void* object);
+    void note_unreadable(const char* name);
     const char* build_hiername(HX_BLOCK* block);
 
     // Properties.
@@ -305,6 +306,9 @@ class VRX {
     // The block whose signal statements are being written: a net that a tag
     // property names is named as seen from its section.
     const HX_BLOCK* signal_section = nullptr;
+    // Names written in this vrx_write that will not read back as they are.
+    uint32_t unreadable_names = 0;
+    std::string first_unreadable;
     uint32_t constructs_written = 0;  // counts toward the next progress report
     // Reader state.
     uint8_t make_physroot;

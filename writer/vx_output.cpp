@@ -70,21 +70,25 @@ bool is_keyword(const char* name) {
 // Byte classes for names. A bare word cannot hold blanks, line feeds or
 // separators: they end or split it. The first four of those are the
 // format's own quoting rule; the others would otherwise break the file.
-enum : unsigned char { kStop = 1, kNotDigit = 2 };
+// A carriage return cannot stand in a bare word either. A double quote can
+// stand nowhere: such a name is written bare as ever, and noted.
+enum : unsigned char { kStop = 1, kNotDigit = 2, kUnreadable = 4 };
 struct NameBytes {
     unsigned char table[256] = {};
     constexpr NameBytes() {
         for (int c = 0; c < 256; ++c)
             table[c] = (c >= '0' && c <= '9') ? 0 : kNotDigit;
         table[0] |= kStop;
-        for (unsigned char c : {' ', '(', ')', '=', '\t', '\n', '{', '}'})
+        for (unsigned char c : {' ', '(', ')', '=', '\t', '\n', '{', '}', '\r'})
             table[c] |= kStop;
+        table[static_cast<unsigned char>('"')] |= kUnreadable;
     }
 };
 constexpr NameBytes kNameBytes;
 
-// True when the name cannot stand bare; `length` receives its length.
-bool needs_quotes(const char* name, std::size_t& length) {
+// True when the name cannot stand bare; `length` receives its length and
+// `unreadable` whether the bare word would not read back as the name.
+bool needs_quotes(const char* name, std::size_t& length, bool& unreadable) {
     const auto* p = reinterpret_cast<const unsigned char*>(name);
     unsigned char seen = 0;
     std::size_t n = 0;
@@ -92,10 +96,20 @@ bool needs_quotes(const char* name, std::size_t& length) {
         seen |= kNameBytes.table[p[n++]];
     if (p[n] != 0) return true;
     length = n;
+    unreadable = (seen & kUnreadable) != 0 || n > static_cast<std::size_t>(VX_MAX_TEXT);
     // "//" would start a comment; a digit run with a leading zero would read
     // back as a number without it.
     if (name[0] == '/' && name[1] == '/') return true;
     return !(seen & kNotDigit) && n > 1 && name[0] == '0';
+}
+
+// Whether the quoted text reads back as `name`: no quote can sit inside
+// one, a CR LF inside one reads as LF, and the reader takes 1024 bytes.
+bool readable_quoted(const char* name, std::size_t length) {
+    if (length + 2 > VX_MAX_TEXT) return false;
+    const char* cr = std::strchr(name, '\r');
+    return std::strchr(name, '"') == nullptr &&
+           (cr == nullptr || std::strstr(cr, "\r\n") == nullptr);
 }
 
 std::string quoted(const char* name) {
@@ -270,10 +284,21 @@ VX_LEGALNAME VRX::quote_kwd(const char* name) {
     return VX_LEGALNAME::refer(vx_text(name));
 }
 
+// The text of such a name is written all the same (the rest of the file is
+// good); vrx_write tells how many there were and the first, once.
+void VRX::note_unreadable(const char* name) {
+    if (unreadable_names++ == 0) first_unreadable = name;
+}
+
 VX_LEGALNAME VRX::vrx_legal(const char* name, const void* object) {
     if (vx_present(name)) {
         std::size_t length = 0;
-        if (needs_quotes(name, length)) return VX_LEGALNAME::own(quoted(name));
+        bool unreadable = false;
+        if (needs_quotes(name, length, unreadable)) {
+            if (!readable_quoted(name, std::strlen(name))) note_unreadable(name);
+            return VX_LEGALNAME::own(quoted(name));
+        }
+        if (unreadable) note_unreadable(name);
         if (is_keyword(name)) return VX_LEGALNAME::own(quoted(name));
         return VX_LEGALNAME::refer(std::string_view(name, length));
     }

@@ -106,7 +106,7 @@ TEST_F(OutputLayerTest, NamesAreQuotedWhenTheReaderWouldNotReadThemBack) {
         EXPECT_EQ(A::vrx_legal(vrx, bare, nullptr), bare);
     }
     const std::vector<std::string> quoted = {"a=b", "x(3)", "x)", "a b", "PIN x", "a\tb", "a\nb",
-                                             "a{b", "}", "//x", "//", "007", "00",
+                                             "a{b", "}", "//x", "//", "007", "00", "a\rb",
                                              // The ten statement keywords, exactly as written.
                                              "DESIGN", "BLOCK", "PHYSBLOCK", "PRIM", "PHYSPRIM",
                                              "SIGNAL", "PHYSSIGNAL", "PIN", "MAPSIGNAL", "MAPCONN"};

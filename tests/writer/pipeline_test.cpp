@@ -126,6 +126,25 @@ TEST_F(PipelineTest, FileStartsWithTheTwoHeaderLines) {
     expect_untouched(path, written.c_str());
 }
 
+// The text cannot carry some names; the file is written, and the write says so once.
+TEST_F(PipelineTest, NamesThatWillNotReadBackAreCountedInOneWarning) {
+    HX_LOGBLOCK* top = design->create_logblock(nullptr, 3, "top");
+    name_pin(top, 0, "a\"b", HX_PIN_IN);
+    name_pin(top, 1, std::string(1025, 'n').c_str(), HX_PIN_IN);
+    name_pin(top, 2, "cr\r\nlf", HX_PIN_IN);
+    select_design();
+    const std::string path = dir.file("out.vrx");
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
+    expect_pipeline_report(PORT_MSG_WARNING,
+                           "3 name(s) in '" + path +
+                               "' will not read back as written (a double quote, a carriage "
+                               "return before a line feed, or more than 1024 bytes), the first "
+                               "'a\"b'\n");
+    capture.clear();
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);  // counted afresh
+    EXPECT_EQ(capture.texts(PORT_MSG_WARNING).size(), 1u);
+}
+
 TEST_F(PipelineTest, DesignFileReadsBackToTheSameText) {
     make_small_design();
     EXPECT_EQ(body(), text(kSmallDesign));
