@@ -6,11 +6,14 @@
 #include <string>
 #include <vector>
 
+#include "chain_netlist.h"
 #include "msg_capture.h"
 #include "scratch_dir.h"
 #include "vrx.h"
 
 namespace {
+
+using vrx_test::chain_netlist;
 
 struct Report {
     std::string what;
@@ -20,20 +23,6 @@ struct Report {
 
 void record(void* reports, const char* what, uint64_t done, uint64_t total) {
     static_cast<std::vector<Report>*>(reports)->push_back({what, done, total});
-}
-
-// A chain of AND gates, about 80 bytes of text and 70 of database file each:
-// 150,000 make several chunks of every step.
-std::string chain_netlist(int gates) {
-    std::string text =
-        "DESIGN chain {\n   BLOCK chain 2 (NAME=chain) {\n"
-        "      PIN a (TYPE=IN CONN=n0)\n";
-    text += "      PIN y (TYPE=OUT CONN=n" + std::to_string(gates) + ")\n   }\n";
-    for (int i = 0; i < gates; ++i) {
-        text += "   PRIM AND 2 { PIN IN (CONN=n" + std::to_string(i) + ") PIN IN (CONN=n0) ";
-        text += "PIN OUT (CONN=n" + std::to_string(i + 1) + ") }\n";
-    }
-    return text + "}\n";
 }
 
 /// One step's reports, taken: all on `verb` and `path`, at least

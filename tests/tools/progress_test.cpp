@@ -13,28 +13,17 @@
 #include <string>
 #include <vector>
 
+#include "chain_netlist.h"
 #include "scratch_dir.h"
 #include "tool_progress.h"
 #include "tool_run.h"
 
 namespace {
 
+using vrx_test::chain_netlist;
+
 using vrx_test::ToolRun;
 using namespace std::chrono_literals;
-
-// A chain of `gates` AND gates from input a to output y: many scanner
-// blocks and several chunks of written text for a few thousand gates.
-std::string chain_netlist(int gates) {
-    std::string text =
-        "DESIGN chain {\n   BLOCK chain 2 (NAME=chain) {\n"
-        "      PIN a (TYPE=IN CONN=n0)\n";
-    text += "      PIN y (TYPE=OUT CONN=n" + std::to_string(gates) + ")\n   }\n";
-    for (int i = 0; i < gates; ++i) {
-        text += "   PRIM AND 2 { PIN IN (CONN=n" + std::to_string(i) + ") PIN IN (CONN=n0) ";
-        text += "PIN OUT (CONN=n" + std::to_string(i + 1) + ") }\n";
-    }
-    return text + "}\n";
-}
 
 struct Captured {
     int status = -1;
