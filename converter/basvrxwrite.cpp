@@ -21,6 +21,7 @@
 #include "ut_timestamp.h"
 #include "vrx.h"
 #include "vx_builder_internal.h"
+#include "vx_progress_hooks.h"
 #include "vx_write_internal.h"
 
 namespace {
@@ -42,15 +43,6 @@ void track_temp(const char* name) {
     (void)hooked;
     pending_temp = name;
 }
-
-// Takes the progress hook back from the database on every way out,
-// exceptions included: it points at the converter.
-struct ProgressHookOff {
-    ProgressHookOff() = default;
-    ProgressHookOff(const ProgressHookOff&) = delete;
-    ProgressHookOff& operator=(const ProgressHookOff&) = delete;
-    ~ProgressHookOff() { HX_FILE_IO::set_progress(nullptr, nullptr); }
-};
 
 // Removes the temporary file and stops tracking it; false when it stays.
 bool remove_temp(const char* temp_name) {
@@ -83,7 +75,7 @@ VX_STATUS VRX::hxb_read(const char* path) {
     }
     VX_STATUS status = VX_OK;
     begin_progress("reading", path);
-    const ProgressHookOff hook_off;
+    const VX_PROGRESS_HOOKS_OFF hooks_off;
     if (progress_fn != nullptr) HX_FILE_IO::set_progress(forward_progress, this);
     switch (hx_env.get_file_type(db_file)) {
         case HX_FILE_DESIGN:

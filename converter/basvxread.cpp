@@ -25,8 +25,8 @@
 #include "ut_path.h"
 #include "ut_str.h"
 #include "vrx.h"
-#include "vrx_scan.h"
 #include "vx_builder_internal.h"
+#include "vx_progress_hooks.h"
 
 namespace {
 
@@ -52,18 +52,6 @@ class InputFile {
 
   private:
     std::FILE* file_;
-};
-
-// Takes the progress hooks back from the reader and the database on every
-// way out, exceptions included: they point at the converter.
-struct ProgressHooksOff {
-    ProgressHooksOff() = default;
-    ProgressHooksOff(const ProgressHooksOff&) = delete;
-    ProgressHooksOff& operator=(const ProgressHooksOff&) = delete;
-    ~ProgressHooksOff() {
-        vrx_set_scan_progress(nullptr, nullptr);
-        HX_FILE_IO::set_progress(nullptr, nullptr);
-    }
 };
 
 // 0 when the size is not known (a pipe, say).
@@ -126,7 +114,7 @@ VX_STATUS VRX::read_one_file(const char* name) {
     vrx_parse_init();
     progress_total = file_size(path.c_str());
     begin_progress("reading", path.c_str());
-    const ProgressHooksOff hooks_off;
+    const VX_PROGRESS_HOOKS_OFF hooks_off;
     if (progress_fn != nullptr) vrx_set_scan_progress(forward_scan_progress, this);
     if (vrx_parse() != 0 || parser_status != VX_PARSER_OK) {
         read_msg(__LINE__).issueError("parse of input file failed\n");
@@ -206,7 +194,7 @@ VX_STATUS VRX::hxb_write(const char* path) {
     }
     read_msg(__LINE__).issueStatus("writing %s ...\n", out.c_str());
     begin_progress("writing", out.c_str());
-    const ProgressHooksOff hooks_off;
+    const VX_PROGRESS_HOOKS_OFF hooks_off;
     if (progress_fn != nullptr) HX_FILE_IO::set_progress(forward_progress, this);
     const bool written =
         is_design ? hx_env.write_design(db_file, design) : hx_env.write_library(db_file, library);

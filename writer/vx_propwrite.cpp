@@ -27,11 +27,6 @@ namespace {
 // the longest property has been seen.
 std::string prop_text;
 
-bool names_net_tag(const char* name) {
-    return std::strcmp(name, "MERGEDTO") == 0 || std::strcmp(name, "MERGEDFROM") == 0 ||
-           std::strcmp(name, "JOINED") == 0;
-}
-
 // Starts the text of a property: the lead-in that opens the list or follows
 // the one before, then the name.
 void begin_text(uint8_t opened, std::string_view name) {
@@ -50,7 +45,7 @@ void append_float(double value) {
 void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* block) {
     // Whether the value is a net's tag goes by the stored name: a filter may
     // rename the property on its way out.
-    const bool net_tag = names_net_tag(prop->get_name());
+    const bool net_tag = prop->names_network_tag();
     if (prop_filter != nullptr) {
         const HX_PROPERTY* mapped = nullptr;
         prop_filter->map_prop(prop, mapped);
