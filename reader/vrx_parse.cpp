@@ -64,6 +64,7 @@
 // When the run is to end (the error limit, or a fatal scanner stop) and the
 // host's exit handler returns, the parser stops at once: it reads no further
 // token, makes no further callback or report, and returns 1.
+#include <cstdio>
 #include <cstring>
 
 #include "vrx_parser.h"
@@ -112,6 +113,19 @@ void format_decimal(int32_t value, char* out) {
     while (n > 0)
         *out++ = digits[--n];
     *out = '\0';
+}
+
+// A width travels as 16 bits: a larger number keeps its low 16 bits, which
+// would silently give a block of 65536 pins none, so it is reported.
+uint16_t width_of(int32_t number) {
+    const auto width = static_cast<uint16_t>(number & 0xFFFF);
+    if (number > 0xFFFF) {
+        char text[112];
+        std::snprintf(text, sizeof text, "width %d is above 65535: its low 16 bits, %u, are used%s",
+                      number, unsigned(width), width == 0xFFFF ? " (no width)" : "");
+        vrx_parse_warning(text);
+    }
+    return width;
 }
 
 class Parser {
@@ -295,7 +309,7 @@ bool Parser::block_stmt() {
     take_name(first_);
     uint16_t width = 0xFFFF;
     if (peek() == VX_TOK_NUMBER) {
-        width = static_cast<uint16_t>(token_value.number & 0xFFFF);
+        width = width_of(token_value.number);
         shift();
     }
     if (!prop_list()) return false;

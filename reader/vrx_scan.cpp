@@ -15,8 +15,8 @@
 // keywords, number, word, quoted string, any other byte. Hence keywords are
 // case-sensitive whole words, "//" starts a comment only where a token starts
 // (x//y is one word), and a digit run followed by a word byte is a word (12ab).
-// A quote with no closing quote matches none of them: it is copied to standard
-// output and scanning resumes right behind it.
+// A quote with no closing quote matches none of them: it is reported as a
+// warning on its line and scanning resumes right behind it.
 //
 // Input is read in blocks of up to 8192 bytes into a buffer of 16384 bytes;
 // after each block a progress hook, when installed, hears the bytes read.
@@ -290,8 +290,9 @@ int64_t count_line_ends(const char* p, const char* end) {
 }
 
 // A quote at `tok`. True with a STRING token when the quote is closed. False
-// when it is not: the quote goes to standard output and scanning resumes
-// right behind it.
+// when it is not: the quote is reported and skipped, and scanning resumes
+// right behind it. Its line feeds are not counted yet, so the report shows
+// the quote's own line.
 bool scan_quoted(char* tok) {
     char* p = tok + 1;
     for (;;) {
@@ -301,8 +302,8 @@ bool scan_quoted(char* tok) {
         const std::size_t matched = static_cast<std::size_t>(p - tok);
         if (p != sc.lim || refill(tok) == 0) {
             if (sc.stopped) return false;
-            std::fputc('"', stdout);
             vrx_scan_cur = tok + 1;
+            vrx_parse_warning("unclosed quote skipped");
             return false;
         }
         p = tok + matched;

@@ -88,10 +88,14 @@ TEST(Parser, BlocksPrimitivesAndPins) {
 }
 
 TEST(Parser, NumbersAsNamesAndWidths) {
+    // A width above 65535 keeps its low 16 bits, with a warning on its line.
     expect_parse("DESIGN 1 {\nBLOCK 5 6\nBLOCK x 70000 { PIN 007 (007=0010) }\n}", 0,
                  {"do_library_props({}) @1", "begin_design(1, {}) @1",
-                  "begin_block(5, 6, 0, {}) @3", "end_block() @3", "begin_block(x, 4464, 0, {}) @3",
-                  "do_pin(7, {7=10}) @3", "end_block() @3", "end_design() @4"});
+                  "begin_block(5, 6, 0, {}) @3", "end_block() @3",
+                  "WARNING: Line number 3: width 70000 is above 65535: its low 16 bits, 4464, "
+                  "are used\n",
+                  "begin_block(x, 4464, 0, {}) @3", "do_pin(7, {7=10}) @3", "end_block() @3",
+                  "end_design() @4"});
     // A digit run above the int range is a word: a name, but no width.
     expect_parse("DESIGN d { BLOCK 99999999999 BLOCK x 99999999999 }", 1,
                  {"do_library_props({}) @1", "begin_design(d, {}) @1",
