@@ -163,10 +163,8 @@ void VRX::begin_template_block(const char* label, uint16_t width, VX_PROP_ARRAY*
     HX_BLOCK* block =
         physical ? static_cast<HX_BLOCK*>(design->create_physblock(phys_root, width, label))
                  : design->create_logblock(log_root, width, label);
-    if (block == nullptr) {
-        // The root is a primitive, which takes no children.
-        vx_error("Block %s cannot be placed in design %s: its root is a primitive", label,
-                 vx_text(design->get_name()));
+    if (block == nullptr) {  // the database refused it; nothing of the statement is kept
+        vx_error("cannot create block %s in design %s", label, vx_text(design->get_name()));
         return;
     }
     curr_block = block;
@@ -215,6 +213,7 @@ void VRX::begin_grafted_block(HX_DESIGN* source, VX_PROP_ARRAY* props) {
         curr_block = make_graft(*this, design, log_root, source, kind,
                                 static_cast<LogInstantiate>(&HX_DESIGN::instantiate),
                                 &VRX::do_block_props, props);
+    if (curr_block != nullptr) lookups->grafts.emplace_back(design, source);
 }
 
 // --- Primitives --------------------------------------------------------------------
@@ -245,16 +244,11 @@ void VRX::begin_prim(const char* type, uint16_t width, uint8_t physical_stmt,
     do_block_props(prim, props);
 }
 
-// A child of the root of the statement's kind, or that root itself when the
-// design has none yet; null after an error.
+// A child of the root of the statement's kind, whatever that root is, or
+// that root itself when the design has none yet; null after an error.
 HX_BLOCK* VRX::create_prim(const char* keyword, int32_t type, uint16_t width) {
     HX_BLOCK* root = physical ? static_cast<HX_BLOCK*>(phys_root) : log_root;
     if (root == nullptr && adopt_existing_root(keyword)) return nullptr;
-    if (root != nullptr && root->is_primitive()) {
-        vx_error("Primitive %s cannot be placed in design %s: its root is a primitive", keyword,
-                 vx_text(design->get_name()));
-        return nullptr;
-    }
     HX_BLOCK* prim =
         physical ? static_cast<HX_BLOCK*>(design->create_physprim(phys_root, type, width, nullptr))
                  : design->create_logprim(log_root, type, width, nullptr);

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <cstring>
 #include <unordered_set>
+#include <utility>
 #include <vector>
 
 #include "ut_str.h"
@@ -30,10 +31,12 @@ bool VRX::assign_name(Named* object, const VX_PROP& prop) {
     return true;
 }
 
-/// The builder's keyed lookups and the designs whose merge records wait.
+/// The builder's keyed lookups, the designs whose merge records wait, and
+/// which design was grafted into which.
 struct VX_LOOKUPS {
     VX_BLOCK_INDEX blocks;
     VX_NET_INDEX nets;
     std::vector<HX_DESIGN*> merge_pending;  // in the order their first record came
     std::unordered_set<HX_DESIGN*> merge_pending_set;
+    std::vector<std::pair<const HX_DESIGN*, const HX_DESIGN*>> grafts;  // (into, from)
 };

@@ -106,6 +106,7 @@ void VRX::copy_from(const VRX& other) {
     first_input = other.first_input ? UT_STR::Dup(other.first_input) : nullptr;
     is_design = other.is_design;
     nograft = other.nograft;
+    all_findings = other.all_findings;
     library = other.library;
     design = other.design;
     log_root = other.log_root;

@@ -16,6 +16,10 @@
 #include <memory>
 #include <string>
 #include <system_error>
+#include <unordered_map>
+#include <unordered_set>
+#include <utility>
+#include <vector>
 
 #include "hx_file.h"
 #include "hx_library.h"
@@ -29,6 +33,9 @@
 #include "vx_progress_hooks.h"
 
 namespace {
+
+// Findings of each design-rule check printed unless all are asked for.
+constexpr int kShownFindings = 20;
 
 Port_MsgManData read_msg(int line) {
     return Port_MsgManData::createObject("Quorra", "../s/basvxread", line, "$Revision: 1.2 $");
@@ -98,6 +105,7 @@ VX_STATUS VRX::vrx_read(const DARRAY_NAME& names, uint8_t design_flag, uint8_t p
     for (int32_t i = 0; i < names.count() && result == VX_OK; ++i)
         result = read_one_file(list.get()[i] ? list.get()[i] : "");
     if (result != VX_OK) return result;
+    if (is_design && design != nullptr) warn_unused_designs();
     return check() ? VX_OK : VX_DRC_ERROR;
 }
 
@@ -124,10 +132,64 @@ VX_STATUS VRX::read_one_file(const char* name) {
     return VX_OK;
 }
 
+namespace {
+
+// The designs grafted into `top`, directly or through other grafts, and top.
+std::unordered_set<const HX_DESIGN*> parts_of(
+    const HX_DESIGN* top,
+    const std::vector<std::pair<const HX_DESIGN*, const HX_DESIGN*>>& grafts) {
+    std::unordered_multimap<const HX_DESIGN*, const HX_DESIGN*> uses(grafts.begin(), grafts.end());
+    std::unordered_set<const HX_DESIGN*> parts{top};
+    std::vector<const HX_DESIGN*> todo{top};
+    while (!todo.empty()) {
+        const auto [first, last] = uses.equal_range(todo.back());
+        todo.pop_back();
+        for (auto it = first; it != last; ++it) {
+            if (parts.insert(it->second).second) todo.push_back(it->second);
+        }
+    }
+    return parts;
+}
+
+// "'a', 'b', 'c' and 2 more": the first few names of a list.
+std::string first_names(const std::vector<const char*>& names) {
+    constexpr std::size_t kNamed = 3;
+    std::string text;
+    for (std::size_t i = 0; i < names.size() && i < kNamed; ++i)
+        text += UT_STR::Format("%s'%s'", i == 0 ? "" : ", ", vx_text(names[i]));
+    if (names.size() > kNamed) text += UT_STR::Format(" and %zu more", names.size() - kNamed);
+    return text;
+}
+
+}  // namespace
+
+// In design mode only the last design is stored; every earlier design of a
+// complete text is part of it. One that is not was read for nothing, which
+// is what a text cut at a design boundary looks like.
+void VRX::warn_unused_designs() const {
+    const std::unordered_set<const HX_DESIGN*> parts = parts_of(design, lookups->grafts);
+    std::vector<const char*> unused;
+    UT_BLIST_ITER<HX_LIBLINK>* iter = library->create_liblink_iter();
+    while (const HX_LIBLINK* link = iter->l_next()) {
+        if (parts.count(link->get_design()) == 0) unused.push_back(link->get_design()->get_name());
+    }
+    library->delete_liblink_iter(iter);
+    if (unused.empty()) return;
+    read_msg(__LINE__).issueWarning(
+        "%zu %s not part of the stored design '%s' (neither grafted nor instantiated into it): "
+        "%s; the input may be cut short\n",
+        unused.size(), unused.size() == 1 ? "design read is" : "designs read are",
+        vx_text(design->get_name()), first_names(unused).c_str());
+}
+
 bool VRX::check() {
     Hxb_DRC drc;
     drc.setCheck(Hxb_DRC::CHECK_UNDRIVEN_NET, Hxb_DRC::STATUS_WARNING);
     drc.setCheck(Hxb_DRC::CHECK_UNCONNECTED_PIN, Hxb_DRC::STATUS_WARNING);
+    // Real netlists can have thousands of findings of one kind.
+    if (!all_findings)
+        drc.setReportLimit(kShownFindings,
+                           "vrx2hxb --all-findings (VRX::set_all_findings) shows them all");
     // A text without any design leaves nothing to check in design mode.
     if (is_design && design == nullptr) return true;
     const int status = is_design ? drc.run(design) : drc.run(library);

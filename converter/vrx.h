@@ -126,6 +126,11 @@ class VRX {
                        uint8_t nograft);
     /// The same for one file.
     VX_STATUS vrx_read(const char* name, uint8_t is_design, uint8_t make_physroot, uint8_t nograft);
+    /// The design-rule check after vrx_read prints at most 20 findings of
+    /// each check, then one line with the number left out; with `all` set
+    /// it prints every finding. Its counts are exact either way. Off by
+    /// default; copies take the setting along.
+    void set_all_findings(bool all) { all_findings = all; }
     /// Stores what vrx_read built, the last design (.hxb) or the library
     /// (.hxl), as a database file. A null `path` names the file after the
     /// first input of vrx_read; the extension is set to fit what is written.
@@ -166,6 +171,7 @@ class VRX {
 
     // Text to database: one input file, and the design-rule check.
     VX_STATUS read_one_file(const char* name);
+    void warn_unused_designs() const;
     bool check();
 
     // Builder operations, one per kind of statement of a text netlist.
@@ -327,6 +333,7 @@ class VRX {
     // What the converter holds.
     uint8_t is_design;
     uint8_t nograft;
+    bool all_findings = false;
     HX_LIBRARY* library;
     HX_DESIGN* design;
     HX_BASELOGBLOCK* log_root;

@@ -2,7 +2,7 @@
 // or library (.hxl) file.
 //
 //   vrx2hxb [-l | --library] [-p | --physroot] [-n | --nograft] [-o FILE | --output FILE]
-//           [-q | --quiet] INPUT...
+//           [-a | --all-findings] [-q | --quiet] INPUT...
 //
 // The inputs are read in order into one library. Without -l the last design
 // they define is stored, with -l the whole library. Messages go through the
@@ -27,7 +27,7 @@
 
 namespace {
 
-enum OptionId { kLibrary, kPhysroot, kNograft, kOutput, kQuiet };
+enum OptionId { kLibrary, kPhysroot, kNograft, kOutput, kAllFindings, kQuiet };
 
 // clang-format off
 constexpr vrx_tool::Option kOptions[] = {
@@ -35,6 +35,7 @@ constexpr vrx_tool::Option kOptions[] = {
     {kPhysroot, 'p', "physroot", false},
     {kNograft, 'n', "nograft", false},
     {kOutput, 'o', "output", true},
+    {kAllFindings, 'a', "all-findings", false},
     {kQuiet, 'q', "quiet", false},
 };
 // clang-format on
@@ -43,7 +44,7 @@ constexpr vrx_tool::ToolInfo kInfo = {
     "vrx2hxb",
     VRX_VERSION,
     "[-l | --library] [-p | --physroot] [-n | --nograft] [-o FILE | --output FILE]"
-    " [-q | --quiet] INPUT...",
+    " [-a | --all-findings] [-q | --quiet] INPUT...",
     "\n"
     "Reads the VRX text netlists INPUT..., in order, into one library and stores the last\n"
     "design they define as a design file (.hxb), or with -l the whole library as a library\n"
@@ -57,6 +58,8 @@ constexpr vrx_tool::ToolInfo kInfo = {
     "  -p, --physroot     derive a physical root for designs whose logical root is PHYSICAL\n"
     "  -n, --nograft      with -l, keep designs from being grafted into each other\n"
     "  -o, --output FILE  write the database file FILE\n"
+    "  -a, --all-findings print every finding of the design-rule check, not only the\n"
+    "                     first 20 of each kind\n"
     "  -q, --quiet        print neither status lines nor progress; only warnings and errors\n"
     "      --help         print this help and exit\n"
     "      --version      print the version and exit\n"
@@ -76,6 +79,7 @@ struct Settings {
     uint8_t physroot = 0;
     uint8_t nograft = 0;
     const char* output = nullptr;
+    bool all_findings = false;
     bool quiet = false;
     DARRAY_NAME inputs;
 };
@@ -96,6 +100,9 @@ Settings settings_from(const vrx_tool::CommandLine& line) {
             case kOutput:
                 settings.output = option.argument;  // the last one given counts
                 break;
+            case kAllFindings:
+                settings.all_findings = true;
+                break;
             case kQuiet:
                 settings.quiet = true;
                 break;
@@ -110,6 +117,7 @@ int convert(const Settings& settings) {
     vrx_tool::ProgressLine* progress = vrx_tool::set_up_output(settings.quiet);
     VRX vrx;
     if (progress != nullptr) vrx.set_progress(vrx_tool::ProgressLine::report, progress);
+    vrx.set_all_findings(settings.all_findings);
     const VX_STATUS read = vrx.vrx_read(settings.inputs, settings.library ? 0 : 1,
                                         settings.physroot, settings.nograft);
     if (progress != nullptr) progress->clear();

@@ -97,6 +97,24 @@ TEST_F(BuilderTest, CheckAfterReadingDecidesOnlyOnErrors) {
     EXPECT_NE(design(), nullptr);  // the result stays built
 }
 
+TEST_F(BuilderTest, DesignsReadButNotPartOfTheStoredDesignAreNamed) {
+    // a is part of top through b; the four after b are not.
+    std::string text = "DESIGN a { BLOCK x 0 } DESIGN b { BLOCK b 0 BLOCK a }\n";
+    for (const char* name : {"c", "d", "e", "f"})
+        text += std::string("DESIGN ") + name + " { BLOCK x 0 }\n";
+    text += "DESIGN top { BLOCK top 0 BLOCK b }\n";
+    const auto warnings = [&](const std::string& input, uint8_t is_design) {
+        capture.clear();
+        EXPECT_EQ(read(input, is_design), VX_OK);
+        return own_texts(PORT_MSG_WARNING);
+    };
+    EXPECT_EQ(warnings(text, 1),
+              std::vector<std::string>{"4 designs read are not part of the stored design 'top' "
+                                       "(neither grafted nor instantiated into it): 'c', 'd', "
+                                       "'e' and 1 more; the input may be cut short\n"});
+    EXPECT_TRUE(warnings(text, 0).empty());  // a library keeps every design
+}
+
 TEST_F(BuilderTest, DatabaseFileNamesFollowTheFirstInputOrTheGivenPath) {
     for (uint8_t is_design : {1, 0}) {
         SCOPED_TRACE(is_design);

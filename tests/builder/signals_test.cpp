@@ -147,9 +147,13 @@ TEST_F(BuilderTest, EveryDesignOfAFileHasItsMergeRecordsResolved) {
         ASSERT_EQ(prop_names(a1), "MERGEDTO ");
         EXPECT_EQ(a1->find_prop("MERGEDTO")->get_int(), static_cast<int32_t>(a1->get_tag()));
         EXPECT_EQ(prop_names(a2), "MERGEDFROM ");
-        EXPECT_EQ(
-            own_texts(PORT_MSG_WARNING),
-            std::vector<std::string>{"Net d1/none in JOINED property on net d1/a not found\n"});
+        std::vector<std::string> warnings{"Net d1/none in JOINED property on net d1/a not found\n"};
+        if (is_design)  // only d2 is stored
+            warnings.push_back(
+                "1 design read is not part of the stored design 'd2' (neither "
+                "grafted nor instantiated into it): 'd1'; the input may be cut "
+                "short\n");
+        EXPECT_EQ(own_texts(PORT_MSG_WARNING), warnings);
     }
 }
 

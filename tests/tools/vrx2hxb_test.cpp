@@ -2,6 +2,7 @@
 // database files it writes (or does not write).
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <string>
 #include <vector>
 
@@ -140,9 +141,10 @@ TEST_F(Vrx2hxbTest, UsageErrorsExit64WithUsageOnStandardError) {
         EXPECT_EQ(r.status, 64);
         EXPECT_EQ(r.out, "");
         EXPECT_EQ(r.err.rfind("vrx2hxb: ", 0), 0u) << r.err;
-        EXPECT_NE(r.err.find("usage: vrx2hxb [-l | --library] [-p | --physroot] [-n | --nograft] "
-                             "[-o FILE | --output FILE] [-q | --quiet] INPUT...\n"),
-                  std::string::npos)
+        EXPECT_NE(
+            r.err.find("usage: vrx2hxb [-l | --library] [-p | --physroot] [-n | --nograft] "
+                       "[-o FILE | --output FILE] [-a | --all-findings] [-q | --quiet] INPUT...\n"),
+            std::string::npos)
             << r.err;
     }
     EXPECT_TRUE(dir_.entries().empty());
@@ -299,6 +301,23 @@ TEST_F(Vrx2hxbTest, DesignRuleErrorsStillWriteTheFileAndExit3) {
 
     // A write that fails after the check does not hide the check's status.
     EXPECT_EQ(run({"-o", dir_.file("no-such-folder/clash.hxb"), text}).status, 3);
+}
+
+TEST_F(Vrx2hxbTest, DesignRuleFindingsStopAtTwentyOfAKindUnlessAllAreAsked) {
+    std::string text = "DESIGN d {\n   BLOCK d 0\n   BLOCK box 25 {";
+    for (int i = 0; i < 25; ++i)
+        text += " PIN p" + std::to_string(i);
+    const std::string path = input("open.vrx", (text + " }\n}\n").c_str());
+    const auto lines = [](const std::string& s) { return std::count(s.begin(), s.end(), '\n'); };
+    const ToolRun brief = run({"-q", path});
+    EXPECT_EQ(brief.status, 0);
+    EXPECT_EQ(lines(brief.err), 22) << brief.err;
+    EXPECT_NE(brief.err.find("- 5 more findings 'pin without outer signal' not shown (the first "
+                             "20 are above); vrx2hxb --all-findings (VRX::set_all_findings) "
+                             "shows them all\nWARNING:Quorra - DRC complete with 25 warnings"),
+              std::string::npos);
+    for (const char* option : {"-a", "--all-findings"})
+        EXPECT_EQ(lines(run({"-q", option, path}).err), 26) << option;
 }
 
 TEST_F(Vrx2hxbTest, ErrorLimitEndsTheRunWithStatus2) {

@@ -1,5 +1,7 @@
 #include "hxb_drc.h"
 
+#include <algorithm>
+#include <iterator>
 #include <string_view>
 #include <unordered_set>
 #include <vector>
@@ -25,6 +27,32 @@ bool known_check(int check) {
             return true;
         default:
             return false;
+    }
+}
+
+void issue(Hxb_DRC::Status status, const std::string& text) {
+    const Port_MsgManData msg = PORT_MSG(kModule, kRevision);
+    if (status == Hxb_DRC::STATUS_ERROR)
+        msg.issueError("%s", text.c_str());
+    else
+        msg.issueWarning("%s", text.c_str());
+}
+
+// What the line about held-back findings calls each check.
+const char* check_title(int check) {
+    switch (check) {
+        case Hxb_DRC::CHECK_NO_ROOT:
+            return "design without root block";
+        case Hxb_DRC::CHECK_UNNAMED_PIN:
+            return "pin without name";
+        case Hxb_DRC::CHECK_DUPLICATE_PIN:
+            return "pins sharing a name";
+        case Hxb_DRC::CHECK_MULTIPLE_DRIVERS:
+            return "network with more than one driver";
+        case Hxb_DRC::CHECK_UNCONNECTED_PIN:
+            return "pin without outer signal";
+        default:
+            return "network with loads but no driver";
     }
 }
 
@@ -286,21 +314,37 @@ Hxb_DRC::Status Hxb_DRC::getCheck(Check check) const {
     return known_check(check) ? status_[check] : STATUS_IGNORE;
 }
 
-int Hxb_DRC::run(HX_DESIGN* design) {
+void Hxb_DRC::setReportLimit(int limit, std::string hint) {
+    limit_ = limit > 0 ? limit : 0;
+    hint_ = std::move(hint);
+}
+
+int Hxb_DRC::getNumOmitted(Check check) const {
+    if (!known_check(check) || limit_ == 0 || found_[check] <= limit_) return 0;
+    return found_[check] - limit_;
+}
+
+void Hxb_DRC::start_run() {
     errors_ = 0;
     warnings_ = 0;
+    std::fill(std::begin(found_), std::end(found_), 0);
+}
+
+int Hxb_DRC::run(HX_DESIGN* design) {
+    start_run();
     if (design != nullptr) check_design(*design);
+    report_omitted();
     return result();
 }
 
 int Hxb_DRC::run(HX_LIBRARY* library) {
-    errors_ = 0;
-    warnings_ = 0;
+    start_run();
     if (library == nullptr) return result();
     UT_BLIST_ITER<HX_LIBLINK>* iter = library->create_liblink_iter();
     while (const HX_LIBLINK* link = iter->l_next())
         check_design(*link->get_design());
     library->delete_liblink_iter(iter);
+    report_omitted();
     return result();
 }
 
@@ -309,18 +353,22 @@ void Hxb_DRC::check_design(const HX_DESIGN& design) {
 }
 
 void Hxb_DRC::report(Check check, const std::string& text) {
-    const Port_MsgManData msg = PORT_MSG(kModule, kRevision);
-    switch (status_[check]) {
-        case STATUS_WARNING:
-            ++warnings_;
-            msg.issueWarning("%s", text.c_str());
-            break;
-        case STATUS_ERROR:
-            ++errors_;
-            msg.issueError("%s", text.c_str());
-            break;
-        case STATUS_IGNORE:
-            break;
+    const Status status = status_[check];
+    if (status == STATUS_IGNORE) return;
+    ++(status == STATUS_ERROR ? errors_ : warnings_);
+    if (++found_[check] > limit_ && limit_ != 0) return;
+    issue(status, text);
+}
+
+// One line per check whose findings were held back, after all it printed.
+void Hxb_DRC::report_omitted() const {
+    for (int check = 0; check < kCheckSlots; ++check) {
+        const int omitted = getNumOmitted(static_cast<Check>(check));
+        if (omitted == 0) continue;
+        issue(
+            status_[check],
+            UT_STR::Format("%d more findings '%s' not shown (the first %d are above)%s%s", omitted,
+                           check_title(check), limit_, hint_.empty() ? "" : "; ", hint_.c_str()));
     }
 }
 

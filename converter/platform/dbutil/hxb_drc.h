@@ -2,7 +2,8 @@
 //
 // Each check has a number, a meaning and a status that says what a finding
 // is: ignored, a warning or an error. Every finding is one message at that
-// level, naming the design and the hierarchical names involved.
+// level, naming the design and the hierarchical names involved, unless a
+// report limit holds a flood back (see setReportLimit).
 //
 // Drivers and loads. A network's drivers and loads are the pins at which the
 // net ends:
@@ -58,6 +59,14 @@ class Hxb_DRC {
     void setCheck(Check check, Status status);
     Status getCheck(Check check) const;
 
+    /// Prints at most `limit` findings of each check in a run (0, the
+    /// default: every one). A check with findings held back then gets one
+    /// line at its level with their number, followed by `hint` (how to see
+    /// them all). Counts and results stay exact.
+    void setReportLimit(int limit, std::string hint);
+    /// Findings of `check` found in the last run but not printed.
+    int getNumOmitted(Check check) const;
+
     /// Checks one design, or every design of a library. Returns 0 when
     /// nothing was found, 1 when only warnings were, 2 when errors were. The
     /// counts cover the last run.
@@ -69,11 +78,16 @@ class Hxb_DRC {
   private:
     class Pass;
 
+    void start_run();
     void check_design(const HX_DESIGN& design);
     void report(Check check, const std::string& text);
+    void report_omitted() const;
     int result() const;
 
     Status status_[kCheckSlots];
     int errors_ = 0;
     int warnings_ = 0;
+    int found_[kCheckSlots] = {};  // per check, in the last run
+    int limit_ = 0;
+    std::string hint_;
 };

@@ -482,13 +482,15 @@ void HX_DESIGN::share_text_of(const HX_DESIGN& source) {
 
 // Makes a block of kind T under `parent`, or the root of T's kind when the
 // parent is null. Null when that root exists already, or when the parent is
-// a primitive or belongs to another design.
+// a primitive below a root or belongs to another design. A root primitive
+// takes children: the text makes every later block of its design one.
 template <class T, class... Args>
 T* HX_DESIGN::make_block(HX_BLOCK* parent, uint16_t pin_count, const char* name, Args&&... args) {
     constexpr bool physical = std::is_base_of_v<HX_BASEPHYSBLOCK, T>;
     constexpr bool primitive = std::is_base_of_v<HX_PRIMITIVE, T>;
     HX_BLOCK* root = physical ? static_cast<HX_BLOCK*>(phys_root_) : log_root_;
-    if (parent == nullptr ? root != nullptr : !owns(parent) || parent->is_primitive())
+    if (parent == nullptr ? root != nullptr
+                          : !owns(parent) || (parent->is_primitive() && parent != root))
         return nullptr;
     void* memory = store_->objects.alloc(sizeof(T), alignof(T));
     T* block = new (memory) T(std::forward<Args>(args)...);

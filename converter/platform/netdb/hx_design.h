@@ -408,7 +408,8 @@ class HX_DESIGN : public HX_OBJECT {
 
     // Blocks. A null parent makes the root of that kind; null when the design
     // already has one, when the parent is of the other kind or of another
-    // design, or (primitives) when the type is unknown, a width is missing,
+    // design, when the parent is a primitive other than the root (a root
+    // primitive takes children), or (primitives) when the type is unknown, a width is missing,
     // or the pin count would not fit in 16 bits. A plain block has `width`
     // unnamed pins of direction NOTYPE.
     HX_LOGBLOCK* create_logblock(HX_BASELOGBLOCK* parent, uint16_t width, const char* name);

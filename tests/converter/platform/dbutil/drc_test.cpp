@@ -180,6 +180,24 @@ TEST_F(DrcTest, BlocksWithContentsPassNetsThroughAndBlackBoxesEndThem) {
     EXPECT_EQ(errors(), Texts{"design 'd': network 'top/undriven' has loads but no driver"});
 }
 
+TEST_F(DrcTest, ReportLimitHoldsFloodsBackPerCheckAndKeepsCountsExact) {
+    for (const char* name : {"b1", "b2", "b3", "b4"})
+        buffer(name, nullptr, nullptr)->get_pin(0)->create_prop("UNUSED", HX_PROP_FLAG);
+    HX_SIGNAL* n = signal("n");
+    buffer("b5", n, y_);  // y gets a second driver
+    drc_.setReportLimit(2, "ask for all");
+    EXPECT_EQ(run(), 2);
+    EXPECT_EQ(errors(), (Texts{"design 'd': pin 'OUT' of block 'top/b1' has no outer signal",
+                               "design 'd': pin 'OUT' of block 'top/b2' has no outer signal",
+                               "design 'd': network 'top/y' has 2 drivers, among them pin "
+                               "'OUT' of block 'top/u1' and pin 'OUT' of block 'top/b5'",
+                               "design 'd': network 'top/n' has loads but no driver",
+                               "2 more findings 'pin without outer signal' not shown (the first "
+                               "2 are above); ask for all"}));
+    EXPECT_EQ(drc_.getNumErrors(), 6);
+    EXPECT_EQ(drc_.getNumOmitted(Hxb_DRC::CHECK_UNCONNECTED_PIN), 2);
+}
+
 TEST_F(DrcTest, ALibraryRunCoversEveryDesignAndCountsAfresh) {
     HX_DESIGN* bad = library_.create_design("bad");
     HX_PHYSBLOCK* root = bad->create_physblock(nullptr, 0, "chip");
