@@ -1084,7 +1084,7 @@ class HX_FILE_IO::Decoder {
     }
 
     /// Makes the block through the design, which refuses a parent of the
-    /// other kind, a primitive parent or a second root.
+    /// other kind, a primitive parent below the root or a second root.
     static HX_BLOCK* make_block(HX_DESIGN& design, uint8_t kind, HX_BLOCK* parent, uint8_t type,
                                 uint16_t width, const char* name) {
         const bool physical = (kind & HX_BLK_PHYSICAL) != 0;
