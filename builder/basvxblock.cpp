@@ -55,6 +55,7 @@ void VRX::begin_design(const char* name, VX_PROP_ARRAY* props) {
         found = library->create_design(name);
     }
     design = found;
+    lookups->designs_before_last_design_file = lookups->designs_before_file;
     log_signals.design = found;
     phys_signals.design = found;
     if (found == nullptr) return;

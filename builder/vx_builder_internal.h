@@ -32,11 +32,15 @@ bool VRX::assign_name(Named* object, const VX_PROP& prop) {
 }
 
 /// The builder's keyed lookups, the designs whose merge records wait, and
-/// which design was grafted into which.
+/// which design was grafted into which. Designs are counted in library order:
+/// those read before the current file, and before the file of the last
+/// DESIGN statement.
 struct VX_LOOKUPS {
     VX_BLOCK_INDEX blocks;
     VX_NET_INDEX nets;
     std::vector<HX_DESIGN*> merge_pending;  // in the order their first record came
     std::unordered_set<HX_DESIGN*> merge_pending_set;
     std::vector<std::pair<const HX_DESIGN*, const HX_DESIGN*>> grafts;  // (into, from)
+    std::size_t designs_before_file = 0;
+    std::size_t designs_before_last_design_file = 0;
 };

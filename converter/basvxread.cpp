@@ -119,6 +119,7 @@ VX_STATUS VRX::read_one_file(const char* name) {
     }
     read_msg(__LINE__).issueStatus("reading VRX file %s ...\n", path.c_str());
     parser_status = VX_PARSER_OK;
+    lookups->designs_before_file = library->design_count();
     vrx_parse_init();
     progress_total = file_size(path.c_str());
     begin_progress("reading", path.c_str());
@@ -165,13 +166,18 @@ std::string first_names(const std::vector<const char*>& names) {
 
 // In design mode only the last design is stored; every earlier design of a
 // complete text is part of it. One that is not was read for nothing, which
-// is what a text cut at a design boundary looks like.
+// is what a text cut at a design boundary looks like. Earlier files may hold
+// cell libraries of which a design uses a few: only the designs of the
+// stored design's own file are looked at.
 void VRX::warn_unused_designs() const {
     const std::unordered_set<const HX_DESIGN*> parts = parts_of(design, lookups->grafts);
     std::vector<const char*> unused;
+    std::size_t position = 0;
     UT_BLIST_ITER<HX_LIBLINK>* iter = library->create_liblink_iter();
     while (const HX_LIBLINK* link = iter->l_next()) {
-        if (parts.count(link->get_design()) == 0) unused.push_back(link->get_design()->get_name());
+        const bool same_file = position++ >= lookups->designs_before_last_design_file;
+        if (same_file && parts.count(link->get_design()) == 0)
+            unused.push_back(link->get_design()->get_name());
     }
     library->delete_liblink_iter(iter);
     if (unused.empty()) return;

@@ -113,6 +113,15 @@ TEST_F(BuilderTest, DesignsReadButNotPartOfTheStoredDesignAreNamed) {
                                        "(neither grafted nor instantiated into it): 'c', 'd', "
                                        "'e' and 1 more; the input may be cut short\n"});
     EXPECT_TRUE(warnings(text, 0).empty());  // a library keeps every design
+    // Cells of an earlier file need not all be used.
+    ScratchDir::write_file(dir.file("cells.vrx"), "DESIGN a { BLOCK x 0 } DESIGN c { BLOCK x 0 }");
+    ScratchDir::write_file(dir.file("top.vrx"), "DESIGN top { BLOCK top 0 BLOCK a }");
+    DARRAY_NAME names;
+    names.add(dir.file("cells.vrx").c_str());
+    names.add(dir.file("top.vrx").c_str());
+    capture.clear();
+    EXPECT_EQ(vrx.vrx_read(names, 1, 0, 0), VX_OK);
+    EXPECT_TRUE(own_texts(PORT_MSG_WARNING).empty());
 }
 
 TEST_F(BuilderTest, DatabaseFileNamesFollowTheFirstInputOrTheGivenPath) {
