@@ -433,7 +433,8 @@ def campaign(args, mutants):
 
 
 def main():
-    parser = argparse.ArgumentParser(description=__doc__.split('\n')[0])
+    parser = argparse.ArgumentParser(description=__doc__,
+                                     formatter_class=argparse.RawDescriptionHelpFormatter)
     parser.add_argument('--seed', type=int, default=16, help='picks the mutants (default 16)')
     parser.add_argument('--count', type=int, default=300, help='mutants to try (default 300)')
     parser.add_argument('--paths', default=DEFAULT_PATHS,
