@@ -267,12 +267,19 @@ def run(cmd, timeout=None):
     try:
         return proc.communicate(timeout=timeout)[0], proc.returncode
     except subprocess.TimeoutExpired:
-        os.killpg(proc.pid, signal.SIGKILL)
+        kill_group(proc)
         return proc.communicate()[0], None
     except BaseException:
-        os.killpg(proc.pid, signal.SIGKILL)
+        kill_group(proc)
         proc.wait()
         raise
+
+
+def kill_group(proc):
+    try:
+        os.killpg(proc.pid, signal.SIGKILL)
+    except ProcessLookupError:  # it ended by itself meanwhile
+        pass
 
 
 def checksum(path):
@@ -307,7 +314,10 @@ class Workspace:
             return
         entry = json.loads(self.journal.read_text())
         target = ROOT / entry['path']
-        if self.backup.exists() and checksum(self.backup) == entry['sha256'] != checksum(target):
+        if not self.backup.exists() or checksum(self.backup) != entry['sha256']:
+            sys.exit(f"mutate: {self.journal} names {entry['path']}, whose saved original is "
+                     'missing or damaged; check that file, then remove the journal')
+        if checksum(target) != entry['sha256']:
             shutil.copyfile(self.backup, target)
             print(f"mutate: restored {entry['path']}, left mutated by an interrupted run")
         self.backup.unlink(missing_ok=True)
@@ -461,6 +471,8 @@ def main():
     if not files:
         parser.error('no source file matches --paths and --files')
     mutants = choose(files, args.count, args.seed, kinds)
+    if not mutants:
+        parser.error('no mutant chosen: raise --count or widen --paths and --files')
     if args.list:
         for m in mutants:
             print(m.describe())
