@@ -465,10 +465,10 @@ std::unordered_map<std::string, HX_BLOCK*> VRX::library_sections() {
         UT_BLIST_ITER<HX_BLOCK>* blocks = link->get_design()->create_block_iter();
         while (HX_BLOCK* block = blocks->l_next()) {
             const char* plain = block->get_name();
-            std::string hier = vx_text(block->get_hiername());
-            if (block->get_parent() == nullptr || block->child_count() == 0 || !vx_present(plain) ||
-                hier.empty())
+            if (block->get_parent() == nullptr || block->child_count() == 0 || !vx_present(plain))
                 continue;
+            std::string hier = vx_text(block->get_hiername());
+            if (hier.empty()) continue;
             if (block->find_prop("TRANSPARENT") != nullptr) hier += ".TRANSPARENT";
             if (named_like_its_root(block, plain)) {
                 hier.clear();
@@ -504,8 +504,8 @@ struct SCRATCH_FILE {
 };
 
 bool same_bytes(int a, int b) {
-    struct stat sa {
-    }, sb{};
+    struct stat sa;
+    struct stat sb;
     if (::fstat(a, &sa) != 0 || ::fstat(b, &sb) != 0 || sa.st_size != sb.st_size) return false;
     static constexpr std::size_t kChunk = std::size_t{1} << 16;
     std::vector<char> x(kChunk), y(kChunk);
@@ -551,13 +551,29 @@ bool VRX::write_scratch_section(int fd, HX_DESIGN* owner, HX_BLOCK* block) {
     if (copy < 0) return false;
     Port::Stream stream(Port::ACCESS_WRITE, std::size_t{1} << 16);
     stream.attach(copy, "", true);
-    Port::Stream* const saved_stream = out_stream;
-    HX_DESIGN* const saved_design = design;
-    const int32_t saved_column = column;
-    const int16_t saved_indent = indent;
-    const uint32_t saved_constructs = constructs_written;
-    const uint32_t saved_unreadable = unreadable_names;
-    const VX_PROGRESS_FN saved_progress = progress_fn;
+    // What the text being written keeps, put back however the section ends.
+    struct SAVED {
+        VRX& vrx;
+        Port::Stream* stream;
+        HX_DESIGN* design;
+        int32_t column;
+        int16_t indent;
+        uint32_t constructs;
+        uint32_t unreadable;
+        VX_PROGRESS_FN progress;
+        ~SAVED() {
+            vrx.out_stream = stream;
+            vrx.design = design;
+            vrx.column = column;
+            vrx.indent = indent;
+            vrx.constructs_written = constructs;
+            vrx.unreadable_names = unreadable;
+            vrx.progress_fn = progress;
+            vrx.scratch_write = false;
+            vrx.scratch_top = nullptr;
+        }
+    } const saved{*this,  out_stream,         design,           column,
+                  indent, constructs_written, unreadable_names, progress_fn};
     out_stream = &stream;
     design = owner;
     column = 0;
@@ -566,15 +582,6 @@ bool VRX::write_scratch_section(int fd, HX_DESIGN* owner, HX_BLOCK* block) {
     scratch_write = true;
     scratch_top = block;
     traverse(block, block->is_physical());
-    scratch_top = nullptr;
-    scratch_write = false;
-    progress_fn = saved_progress;
-    unreadable_names = saved_unreadable;
-    constructs_written = saved_constructs;
-    indent = saved_indent;
-    column = saved_column;
-    design = saved_design;
-    out_stream = saved_stream;
     return stream.flush() && !stream.failed();
 }
 
