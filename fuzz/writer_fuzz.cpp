@@ -8,6 +8,7 @@
 // many inputs the decoder accepted and how many of those were written out.
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstdio>
@@ -17,68 +18,51 @@
 #include "fuzz_host.h"
 #include "hx_file.h"
 #include "hx_library.h"
-#include "port_file.h"
 #include "port_msg.h"
 #include "sealed_file.h"
 #include "vrx.h"
 
 namespace {
 
-struct Counts {
-    unsigned long long tried = 0;     // decoded
-    unsigned long long accepted = 0;  // the decoder accepted
-    unsigned long long written = 0;   // written without a report above info
-    unsigned long long read_back = 0;
-};
-Counts counts;
+unsigned long long tried = 0, accepted = 0, written = 0;
 Port_MsgLevel worst = PORT_MSG_STATUS;
-
-void print_counts() {
-    std::fprintf(stderr,
-                 "writer_fuzz: %llu decoded, %llu accepted, %llu written cleanly, %llu read back\n",
-                 counts.tried, counts.accepted, counts.written, counts.read_back);
-}
 
 void hear_levels() {
     static const bool done = [] {
         quiet_and_alive();
-        Port_MsgDispatcher::set_sink(
-            [](Port_MsgLevel level, const Port_MsgLocation&, std::string_view) {
-                if (level > worst) worst = level;
-            });
-        std::atexit(print_counts);
+        Port_MsgDispatcher::set_sink([](Port_MsgLevel level, const Port_MsgLocation&,
+                                        std::string_view) { worst = std::max(worst, level); });
+        std::atexit([] {
+            std::fprintf(stderr, "writer_fuzz: %llu decoded, %llu accepted, %llu written\n", tried,
+                         accepted, written);
+        });
         return true;
     }();
     (void)done;
 }
 
-const std::string& text_path() {
-    static const std::string path =
-        "/dev/shm/vrx_writer_fuzz_" + std::to_string(::getpid()) + ".vrx";
-    return path;
-}
-
-void read_back(HX_FILE_TYPE kind) {
-    HX_LIBRARY* library = nullptr;
+void read_back(const char* path, HX_FILE_TYPE kind) {
     VX_STATUS status = VX_OK;
+    HX_LIBRARY* library = nullptr;
     {
         VRX vrx;
-        status = vrx.vrx_read(text_path().c_str(), kind == HX_FILE_DESIGN, 0, 1);
+        status = vrx.vrx_read(path, kind == HX_FILE_DESIGN, 0, 1);
         library = vrx.get_library();
     }
     if (library != nullptr) hx_env.delete_library(library);
     if (status != VX_OK && status != VX_DRC_ERROR) __builtin_trap();
-    ++counts.read_back;
 }
 
 void decode_and_write(const void* data, size_t size) {
+    static const std::string path =
+        "/dev/shm/vrx_writer_fuzz_" + std::to_string(::getpid()) + ".vrx";
     HX_FILE_TYPE kind = HX_FILE_IO::kind_of(data, size);
     if (kind == HX_FILE_UNKNOWN) kind = HX_FILE_DESIGN;
     std::string reason;
-    ++counts.tried;
+    ++tried;
     auto library = HX_FILE_IO::decode(data, size, kind, reason);
     if (library == nullptr) return;
-    ++counts.accepted;
+    ++accepted;
     HX_DESIGN* design = nullptr;
     if (kind == HX_FILE_DESIGN) {
         auto* links = library->create_liblink_iter();
@@ -89,13 +73,13 @@ void decode_and_write(const void* data, size_t size) {
     VX_STATUS status = VX_OK;
     {
         VRX vrx;
-        status = VRX_TEST_ACCESS::write_file(vrx, design, library.get(), text_path().c_str());
+        status = VRX_TEST_ACCESS::write_file(vrx, design, library.get(), path.c_str());
     }
     if (status == VX_OK && worst <= PORT_MSG_INFO) {
-        ++counts.written;
-        read_back(kind);
+        ++written;
+        read_back(path.c_str(), kind);
     }
-    std::remove(text_path().c_str());
+    std::remove(path.c_str());
 }
 
 }  // namespace

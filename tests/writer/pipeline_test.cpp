@@ -228,14 +228,11 @@ TEST_F(PipelineTest, ALibraryDesignIsLeftOutOnlyWhereTheSectionOfItsNameHoldsItW
     const std::string path = dir.file("l.vrx");
     const auto sections = [&] {
         const std::string written = ScratchDir::read_file(path);
-        std::size_t n = 0;
-        for (std::size_t at = written.find("DESIGN top/u1 {"); at != std::string::npos;
-             at = written.find("DESIGN top/u1 {", at + 1))
-            ++n;
-        return n;
+        const std::regex header("DESIGN top/u1 \\{");
+        return std::distance(std::sregex_iterator(written.begin(), written.end(), header), {});
     };
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
-    EXPECT_EQ(sections(), 1u);
+    EXPECT_EQ(sections(), 1);
     expect_pipeline_report(PORT_MSG_STATUS,
                            "   design top/u1 is written as a section of another design\n");
     EXPECT_EQ(capture.texts(PORT_MSG_WARNING), std::vector<std::string>{});
@@ -243,7 +240,7 @@ TEST_F(PipelineTest, ALibraryDesignIsLeftOutOnlyWhereTheSectionOfItsNameHoldsItW
     one->set_name("other");  // the library's design no longer is what the section holds
     capture.clear();
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
-    EXPECT_EQ(sections(), 2u);
+    EXPECT_EQ(sections(), 2);
     EXPECT_EQ(capture.texts(PORT_MSG_WARNING),
               std::vector<std::string>{
                   "design top/u1 differs from the section of design TOP written under the same "
