@@ -188,8 +188,8 @@ VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
     if (unreadable_names > 0) {
         write_msg(__LINE__).issueWarning(
             "%u name(s) in '%s' will not read back as written (a double quote, a carriage "
-            "return before a line feed, more than 1024 bytes, or a number that is not "
-            "finite), the first '%.80s'\n",
+            "return before a line feed, more than 1024 bytes, a float that is not finite, or a "
+            "value of another kind than its property's name takes), the first '%.80s'\n",
             unreadable_names, path, first_unreadable.c_str());
     }
     if (!Port::File::copy(temp_name, path)) {
@@ -228,6 +228,11 @@ void VRX::write_file_header() {
 // and the text reads back. One that differs from that section is written all
 // the same, with a warning: dropping it would lose it.
 void VRX::write_library() {
+    if (library->design_count() == 0)
+        write_msg(__LINE__).issueWarning(
+            "library %s holds no design; text cannot hold an empty library, so the text written "
+            "will not read back\n",
+            vx_text(library->get_name()));
     uint8_t opened = 0;
     if (library->get_casesense()) {
         write_entry(" (", "CASESENSE", false);

@@ -256,6 +256,7 @@ class VRX {
 
     // Properties.
     void do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* block);
+    void note_foreign_kind(const HX_PROPERTY* prop);
     void write_props(const HX_OBJECT* object, uint8_t* opened);
     void write_prop_list(const HX_OBJECT* object, uint8_t* opened, const HX_BLOCK* block);
     uint8_t has_props(const HX_OBJECT* object);

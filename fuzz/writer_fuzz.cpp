@@ -50,7 +50,9 @@ void read_back(const char* path, HX_FILE_TYPE kind) {
         library = vrx.get_library();
     }
     if (library != nullptr) hx_env.delete_library(library);
-    if (status != VX_OK && status != VX_DRC_ERROR) __builtin_trap();
+    if (status == VX_OK || status == VX_DRC_ERROR) return;
+    std::rename(path, (std::string(path) + ".failed").c_str());  // kept for a look
+    __builtin_trap();
 }
 
 void decode_and_write(const void* data, size_t size) {

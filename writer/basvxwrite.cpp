@@ -414,6 +414,11 @@ void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, std::optional<VX_LEGA
 void VRX::write_design() {
     log_root = design->get_log_root();
     phys_root = design->get_phys_root();
+    if (log_root == nullptr && phys_root == nullptr)
+        vx_write_msg(__LINE__).issueWarning(
+            "design %s has no root block; text cannot hold such a design, so the text written "
+            "will not read back\n",
+            vx_text(design->get_name()));
     write_contents(log_root, 0);
     write_contents(phys_root, 1);
     write_root_design();

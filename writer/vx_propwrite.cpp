@@ -76,6 +76,7 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
         case HX_PROP_FLAG:
             if (*opened) {
                 write_pair(" ", token.view());
+                note_foreign_kind(prop);
                 return;
             }
             begin_text(*opened, token.view());
@@ -168,7 +169,16 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
             return;
     }
     write_item(prop_text);
+    note_foreign_kind(prop);
     *opened = 1;
+}
+
+// The reader takes a predefined name's value as that name's kind: a value
+// of another kind is refused there, or comes back as another kind.
+void VRX::note_foreign_kind(const HX_PROPERTY* prop) {
+    HX_PROP_TYPE kind = prop->get_kind();
+    if (HX_PROPERTY::get_type(prop->get_name(), kind) && kind != prop->get_kind())
+        note_unreadable(prop->get_name());
 }
 
 // Text is read a section at a time, each as a design of its own, where only

@@ -123,6 +123,9 @@ TEST_F(PipelineTest, FileStartsWithTheTwoHeaderLines) {
     ASSERT_TRUE(std::regex_match(written, match, layout)) << written;
     EXPECT_EQ(match[1].str(), kHeaderLine2);
     expect_pipeline_report(PORT_MSG_STATUS, "   writing VRX file '" + path + "' ...\n");
+    expect_writer_report(capture, PORT_MSG_WARNING,
+                         "design d has no root block; text cannot hold such a design, so the text "
+                         "written will not read back\n");
     EXPECT_EQ(errors(), std::vector<std::string>{});
     expect_untouched(path, written.c_str());
 }
@@ -133,16 +136,18 @@ TEST_F(PipelineTest, NamesThatWillNotReadBackAreCountedInOneWarning) {
     name_pin(top, 0, "a\"b", HX_PIN_IN);
     name_pin(top, 1, std::string(1025, 'n').c_str(), HX_PIN_IN);
     name_pin(top, 2, "cr\r\nlf", HX_PIN_IN);
-    design->create_logblock(top, 0, "c")
-        ->create_prop(HX_PROPERTY::make_float("CAP", -INFINITY), nullptr);
+    HX_LOGBLOCK* c = design->create_logblock(top, 0, "c");
+    c->create_prop(HX_PROPERTY::make_float("CAP", -INFINITY), nullptr);
+    c->create_prop(HX_PROPERTY::make_float("DRIVE", 1), nullptr);  // an integer on reading
     select_design();
     const std::string path = dir.file("out.vrx");
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
     expect_pipeline_report(PORT_MSG_WARNING,
-                           "4 name(s) in '" + path +
+                           "5 name(s) in '" + path +
                                "' will not read back as written (a double quote, a carriage "
-                               "return before a line feed, more than 1024 bytes, or a number "
-                               "that is not finite), the first 'a\"b'\n");
+                               "return before a line feed, more than 1024 bytes, a float that "
+                               "is not finite, or a value of another kind than its property's "
+                               "name takes), the first 'a\"b'\n");
     capture.clear();
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);  // counted afresh
     EXPECT_EQ(capture.texts(PORT_MSG_WARNING).size(), 1u);
@@ -208,6 +213,10 @@ DESIGN d2 "also d2" {
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
     const std::string header_only = ScratchDir::read_file(path);
     EXPECT_EQ(header_only.substr(header_only.find("\r\n") + 2), kHeaderLine2);
+    expect_pipeline_report(PORT_MSG_WARNING,
+                           "library E holds no design; text cannot hold an "
+                           "empty library, so the text written will not read "
+                           "back\n");
     A::library(vrx) = nullptr;
 }
 
