@@ -10,7 +10,6 @@
 #include <cstring>
 #include <memory>
 #include <string>
-#include <unordered_set>
 
 #include "hx_file.h"
 #include "hx_library.h"
@@ -158,13 +157,16 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
     constructs_written = 0;
     unreadable_names = 0;
     first_unreadable.clear();
+    invented_ids.clear();
     vx_write_reset_fatal();
     write_file_header();
     if (is_design)
         write_design();
     else
         write_library();
-    return finish_write(path, temp_name.get());
+    const VX_STATUS status = finish_write(path, temp_name.get());
+    std::unordered_map<const void*, uint32_t>().swap(invented_ids);
+    return status;
 }
 
 // Closes the temporary file and puts it in place when it is whole.
@@ -186,7 +188,8 @@ VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
     if (unreadable_names > 0) {
         write_msg(__LINE__).issueWarning(
             "%u name(s) in '%s' will not read back as written (a double quote, a carriage "
-            "return before a line feed, or more than 1024 bytes), the first '%.80s'\n",
+            "return before a line feed, more than 1024 bytes, a float that is not finite, or a "
+            "value of another kind than its property's name takes), the first '%.80s'\n",
             unreadable_names, path, first_unreadable.c_str());
     }
     if (!Port::File::copy(temp_name, path)) {
@@ -220,10 +223,16 @@ void VRX::write_file_header() {
 // that reading the text back gives a library that finds the same designs.
 //
 // A library read from text holds a design for every section of its text, and
-// the designs that used them hold copies: a design whose name a section of
-// another design will carry is left out, so that each name is defined once
-// and the text reads back.
+// the designs that used them hold copies: a design that a section of another
+// design will define as it is, is left out, so that each name is defined once
+// and the text reads back. One that differs from that section is written all
+// the same, with a warning: dropping it would lose it.
 void VRX::write_library() {
+    if (library->design_count() == 0)
+        write_msg(__LINE__).issueWarning(
+            "library %s holds no design; text cannot hold an empty library, so the text written "
+            "will not read back\n",
+            vx_text(library->get_name()));
     uint8_t opened = 0;
     if (library->get_casesense()) {
         write_entry(" (", "CASESENSE", false);
@@ -231,22 +240,24 @@ void VRX::write_library() {
     }
     write_props(library, &opened);
     if (opened) write_string(")", "\r\n");
-    std::unordered_set<std::string> sections;
+    const std::unordered_map<std::string, HX_BLOCK*> sections = library_sections();
     UT_BLIST_ITER<HX_LIBLINK>* links = library->create_liblink_iter();
-    while (HX_LIBLINK* link = links->l_next())
-        vx_section_names(*link->get_design(), sections);
-    library->delete_liblink_iter(links);
-    links = library->create_liblink_iter();
     while (HX_LIBLINK* link = links->l_next()) {
         design = link->get_design();
-        if (sections.contains(vx_text(design->get_name()))) {
-            write_msg(__LINE__).issueStatus(
-                "   design %s is written as a section of another design\n",
-                vx_text(design->get_name()));
-            continue;
+        const char* name = vx_text(design->get_name());
+        const auto section = sections.find(section_key(name));
+        if (section != sections.end()) {
+            if (same_as_section(design, section->second)) {
+                write_msg(__LINE__).issueStatus(
+                    "   design %s is written as a section of another design\n", name);
+                continue;
+            }
+            write_msg(__LINE__).issueWarning(
+                "design %s differs from the section of design %s written under the same name: "
+                "the text holds two designs of that name and will not read back as written\n",
+                name, vx_text(section->second->get_design()->get_name()));
         }
-        write_msg(__LINE__).issueStatus("   processing design %s ...\n",
-                                        vx_text(design->get_name()));
+        write_msg(__LINE__).issueStatus("   processing design %s ...\n", name);
         write_design();
     }
     library->delete_liblink_iter(links);

@@ -16,6 +16,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 
 #include "hx_design.h"
 #include "hx_library.h"
@@ -255,11 +256,13 @@ class VRX {
     void end_construct();
     VX_LEGALNAME quote_kwd(const char* name);
     VX_LEGALNAME vrx_legal(const char* name, const void* object);
-    void note_unreadable(const char* name);
+    void note_unreadable(std::string_view text);
+    uint32_t invented_identity(const void* object);
     const char* build_hiername(HX_BLOCK* block);
 
     // Properties.
     void do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* block);
+    void note_foreign_kind(const HX_PROPERTY* prop);
     void write_props(const HX_OBJECT* object, uint8_t* opened);
     void write_prop_list(const HX_OBJECT* object, uint8_t* opened, const HX_BLOCK* block);
     uint8_t has_props(const HX_OBJECT* object);
@@ -302,6 +305,12 @@ class VRX {
     void write_root_design();
     void write_root_header(HX_BLOCK* root, uint8_t physical);
 
+    // Library designs that another design writes as a section.
+    std::unordered_map<std::string, HX_BLOCK*> library_sections();
+    std::string section_key(std::string name) const;
+    bool same_as_section(HX_DESIGN* candidate, HX_BLOCK* section);
+    bool write_scratch_section(int fd, HX_DESIGN* owner, HX_BLOCK* block);
+
     // Writer state.
     int16_t indent;
     Port::Stream* out_stream;
@@ -316,6 +325,12 @@ class VRX {
     uint32_t unreadable_names = 0;
     std::string first_unreadable;
     uint32_t constructs_written = 0;  // counts toward the next progress report
+    // Identities of the unnamed objects named so far in this vrx_write.
+    std::unordered_map<const void*, uint32_t> invented_ids;
+    // Set while a section is written only to be compared: its reports would
+    // repeat those of the real text.
+    bool scratch_write = false;
+    const HX_BLOCK* scratch_top = nullptr;  // the block that such a section is written for
     // Reader state.
     uint8_t make_physroot;
     VX_PARSER_STATUS parser_status;

@@ -40,4 +40,13 @@ struct VRX_TEST_ACCESS {
         }
         vrx.out_stream = nullptr;
     }
+
+    /// Writes `design` (when given) or `library` as text at `path`.
+    static VX_STATUS write_file(VRX& vrx, HX_DESIGN* design, HX_LIBRARY* library,
+                                const char* path) {
+        vrx.design = design;
+        vrx.library = library;
+        vrx.is_design = design != nullptr;
+        return vrx.vrx_write(path, nullptr, 0);
+    }
 };

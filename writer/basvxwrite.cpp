@@ -8,10 +8,15 @@
 // then the statements of signals that carry what pins cannot (global
 // signals, signal and network properties), and in the design's own section
 // the map signals.
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <algorithm>
 #include <charconv>
+#include <cstdio>
 #include <cstring>
 #include <optional>
+#include <vector>
 
 #include "hx_design.h"
 #include "hx_library.h"
@@ -151,7 +156,7 @@ void VRX::write_object_header(const char* keyword, const HX_OBJECT* object, cons
 // "OBJ_$<identity>_<name>": the label of a block named like its root.
 VX_LEGALNAME VRX::root_clash_label(const HX_BLOCK* block, const char* plain) {
     std::string text;
-    vx_append_invented(text, block);
+    vx_append_invented(text, invented_identity(block));
     (text += '_') += plain;
     return vrx_legal(text.c_str(), block).keep();
 }
@@ -163,14 +168,16 @@ void VRX::write_user_flag(const HX_BLOCK* block) {
 void VRX::write_blk_header(HX_BLOCK* block, uint8_t root, uint8_t pin_count) {
     const char* plain = block->get_name();
     const char* hier = build_hiername(block);
+    // A root compared as a section labels its children as a section does.
+    const bool in_root = sits_in_root(block) && block->get_parent() != scratch_top;
     VX_LEGALNAME label;
     if (!vx_present(plain) || !vx_present(hier))
         label = vrx_legal(nullptr, block);
     else if (root)
         label = vrx_legal(plain, block);
-    else if (named_like_its_root(block, plain))
+    else if (in_root && named_like_its_root(block, plain))
         label = root_clash_label(block, plain);
-    else if (sits_in_root(block) || !block->isempty())
+    else if (in_root || !block->isempty())
         label = vrx_legal(hier, block).keep();
     else
         label = vrx_legal(plain, block);
@@ -407,6 +414,11 @@ void VRX::write_unmapped_children(HX_BASEPHYSBLOCK* block, std::optional<VX_LEGA
 void VRX::write_design() {
     log_root = design->get_log_root();
     phys_root = design->get_phys_root();
+    if (log_root == nullptr && phys_root == nullptr)
+        vx_write_msg(__LINE__).issueWarning(
+            "design %s has no root block; text cannot hold such a design, so the text written "
+            "will not read back\n",
+            vx_text(design->get_name()));
     write_contents(log_root, 0);
     write_contents(phys_root, 1);
     write_root_design();
@@ -446,32 +458,136 @@ void VRX::traverse(HX_BLOCK* block, uint8_t physical) {
     end_construct();
 }
 
+// --- library designs written as sections ----------------------------------------------
+
+// The name that reading back gives the design of each section of the
+// library's designs, with the block written as it; the first block wins. A
+// block without a name is labelled by identity and left out.
+std::unordered_map<std::string, HX_BLOCK*> VRX::library_sections() {
+    std::unordered_map<std::string, HX_BLOCK*> sections;
+    UT_BLIST_ITER<HX_LIBLINK>* links = library->create_liblink_iter();
+    while (HX_LIBLINK* link = links->l_next()) {
+        UT_BLIST_ITER<HX_BLOCK>* blocks = link->get_design()->create_block_iter();
+        while (HX_BLOCK* block = blocks->l_next()) {
+            const char* plain = block->get_name();
+            if (block->get_parent() == nullptr || block->child_count() == 0 || !vx_present(plain))
+                continue;
+            std::string hier = vx_text(block->get_hiername());
+            if (hier.empty()) continue;
+            if (block->find_prop("TRANSPARENT") != nullptr) hier += ".TRANSPARENT";
+            if (named_like_its_root(block, plain)) {
+                hier.clear();
+                vx_append_invented(hier, invented_identity(block));
+                (hier += '_') += plain;
+            }
+            sections.try_emplace(section_key(std::move(hier)), block);
+        }
+        link->get_design()->delete_block_iter(blocks);
+    }
+    library->delete_liblink_iter(links);
+    return sections;
+}
+
+// Design names as the library tells them apart.
+std::string VRX::section_key(std::string name) const {
+    if (!library->get_casesense())
+        std::transform(name.begin(), name.end(), name.begin(), [](char c) {
+            return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+        });
+    return name;
+}
+
 namespace {
 
-void add_section_names(const HX_BLOCK* block, std::unordered_set<std::string>& names) {
-    if (block->child_count() == 0) return;
-    for_each_child(block, [&](HX_BLOCK* child) { add_section_names(child, names); });
-    const char* plain = block->get_name();
-    std::string hier = block->get_hiername();
-    if (!vx_present(plain) || hier.empty()) return;  // labelled by identity
-    if (block->find_prop("TRANSPARENT") != nullptr) hier += ".TRANSPARENT";
-    if (named_like_its_root(block, plain)) {
-        std::string clash;
-        vx_append_invented(clash, block);
-        names.insert((clash += '_') += plain);
-    } else {
-        names.insert(std::move(hier));
+// An anonymous scratch file, gone when closed.
+struct SCRATCH_FILE {
+    std::FILE* file = std::tmpfile();
+    ~SCRATCH_FILE() {
+        if (file != nullptr) std::fclose(file);
     }
+    int fd() const { return ::fileno(file); }
+};
+
+bool same_bytes(int a, int b) {
+    struct stat sa;
+    struct stat sb;
+    if (::fstat(a, &sa) != 0 || ::fstat(b, &sb) != 0 || sa.st_size != sb.st_size) return false;
+    static constexpr std::size_t kChunk = std::size_t{1} << 16;
+    std::vector<char> x(kChunk), y(kChunk);
+    for (off_t at = 0; at < sa.st_size;) {
+        const ssize_t n = ::pread(a, x.data(), kChunk, at);
+        if (n <= 0 || ::pread(b, y.data(), static_cast<std::size_t>(n), at) != n ||
+            std::memcmp(x.data(), y.data(), static_cast<std::size_t>(n)) != 0)
+            return false;
+        at += n;
+    }
+    return true;
 }
 
 }  // namespace
 
-void vx_section_names(const HX_DESIGN& design, std::unordered_set<std::string>& names) {
-    for (const HX_BLOCK* root : {static_cast<const HX_BLOCK*>(design.get_log_root()),
-                                 static_cast<const HX_BLOCK*>(design.get_phys_root())}) {
-        if (root == nullptr) continue;
-        for_each_child(root, [&](HX_BLOCK* child) { add_section_names(child, names); });
-    }
+// Whether leaving `candidate` out loses nothing: the section written for
+// `section` (a block of another design) has the same text as the candidate's
+// root written as a section, and the candidate carries nothing that a
+// section does not (design properties, a root of the other kind, map
+// signals, a USER flag on its root). Anything uncertain counts as different.
+bool VRX::same_as_section(HX_DESIGN* candidate, HX_BLOCK* section) {
+    const bool physical = section->is_physical();
+    HX_BLOCK* root = physical ? static_cast<HX_BLOCK*>(candidate->get_phys_root())
+                              : static_cast<HX_BLOCK*>(candidate->get_log_root());
+    const HX_BLOCK* other = physical ? static_cast<HX_BLOCK*>(candidate->get_log_root())
+                                     : static_cast<HX_BLOCK*>(candidate->get_phys_root());
+    UT_BLIST_ITER<HX_MAPSIGNAL>* maps = candidate->create_mapsignal_iter();
+    const bool has_maps = maps->l_next() != nullptr;
+    candidate->delete_mapsignal_iter(maps);
+    if (root == nullptr || other != nullptr || has_maps || root->child_count() == 0 ||
+        (!omit_user && root->get_user()) || has_props(candidate))
+        return false;
+    const SCRATCH_FILE theirs, mine;
+    return theirs.file != nullptr && mine.file != nullptr &&
+           write_scratch_section(theirs.fd(), section->get_design(), section) &&
+           write_scratch_section(mine.fd(), candidate, root) && same_bytes(theirs.fd(), mine.fd());
+}
+
+// Writes the section of `block` of design `owner` (with its own sections
+// first) into `fd`, leaving the state of the text being written as it was.
+bool VRX::write_scratch_section(int fd, HX_DESIGN* owner, HX_BLOCK* block) {
+    const int copy = ::dup(fd);
+    if (copy < 0) return false;
+    Port::Stream stream(Port::ACCESS_WRITE, std::size_t{1} << 16);
+    stream.attach(copy, "", true);
+    // What the text being written keeps, put back however the section ends.
+    struct SAVED {
+        VRX& vrx;
+        Port::Stream* stream;
+        HX_DESIGN* design;
+        int32_t column;
+        int16_t indent;
+        uint32_t constructs;
+        uint32_t unreadable;
+        VX_PROGRESS_FN progress;
+        ~SAVED() {
+            vrx.out_stream = stream;
+            vrx.design = design;
+            vrx.column = column;
+            vrx.indent = indent;
+            vrx.constructs_written = constructs;
+            vrx.unreadable_names = unreadable;
+            vrx.progress_fn = progress;
+            vrx.scratch_write = false;
+            vrx.scratch_top = nullptr;
+        }
+    } const saved{*this,  out_stream,         design,           column,
+                  indent, constructs_written, unreadable_names, progress_fn};
+    out_stream = &stream;
+    design = owner;
+    column = 0;
+    indent = 0;
+    progress_fn = nullptr;
+    scratch_write = true;
+    scratch_top = block;
+    traverse(block, block->is_physical());
+    return stream.flush() && !stream.failed();
 }
 
 void VRX::write_child(HX_BLOCK* block, uint8_t physical) {

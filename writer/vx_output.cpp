@@ -141,9 +141,9 @@ void vx_write_reset_fatal() {
     fatal_seen = false;
 }
 
-void vx_append_invented(std::string& out, const void* object) {
+void vx_append_invented(std::string& out, uint32_t identity) {
     char digits[16];
-    const auto r = std::to_chars(digits, digits + sizeof digits, vx_identity(object), 16);
+    const auto r = std::to_chars(digits, digits + sizeof digits, identity, 16);
     out += "OBJ_$";
     out.append(digits, r.ptr);
 }
@@ -286,8 +286,8 @@ VX_LEGALNAME VRX::quote_kwd(const char* name) {
 
 // The text of such a name is written all the same (the rest of the file is
 // good); vrx_write tells how many there were and the first, once.
-void VRX::note_unreadable(const char* name) {
-    if (unreadable_names++ == 0) first_unreadable = name;
+void VRX::note_unreadable(std::string_view text) {
+    if (unreadable_names++ == 0) first_unreadable = text;
 }
 
 VX_LEGALNAME VRX::vrx_legal(const char* name, const void* object) {
@@ -304,8 +304,15 @@ VX_LEGALNAME VRX::vrx_legal(const char* name, const void* object) {
     }
     if (object == nullptr) return VX_LEGALNAME::refer("\"\"");
     std::string invented;
-    vx_append_invented(invented, object);
+    vx_append_invented(invented, invented_identity(object));
     return VX_LEGALNAME::own(std::move(invented));
+}
+
+// Numbered in the order first named: unique within one vrx_write and the
+// same on every run over the same database, which addresses are not.
+uint32_t VRX::invented_identity(const void* object) {
+    const auto next = static_cast<uint32_t>(invented_ids.size() + 1);
+    return invented_ids.try_emplace(object, next).first->second;
 }
 
 const char* VRX::build_hiername(HX_BLOCK* block) {

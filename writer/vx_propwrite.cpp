@@ -11,6 +11,8 @@
 // pin-reference and timing-string texts and parameter values are quoted by
 // the same rule as names when they would not (a blank, a separator, a
 // keyword, an empty text).
+#include <charconv>
+#include <cmath>
 #include <cstdio>
 #include <cstring>
 
@@ -34,10 +36,26 @@ void begin_text(uint8_t opened, std::string_view name) {
     prop_text += name;
 }
 
-void append_float(double value) {
+// Six decimals where they read back as the same value, so that the usual
+// values look as they always did; else the shortest text that reads back
+// exactly (1e-09 would be 0.000000). False for a NaN or an infinity, which
+// the reader refuses: they are written as "%f" gives them.
+bool append_float(double value) {
     char digits[400];  // "%f" of the largest double fits
     const int n = std::snprintf(digits, sizeof digits, "%f", value);
-    if (n > 0) prop_text.append(digits, static_cast<std::size_t>(n));
+    if (n <= 0) return false;
+    const char* end = digits + n;
+    if (!std::isfinite(value)) {
+        prop_text.append(digits, static_cast<std::size_t>(end - digits));
+        return false;
+    }
+    double back = 0.0;
+    const auto parsed = std::from_chars(digits, end, back);
+    if (parsed.ec != std::errc() || std::memcmp(&back, &value, sizeof value) != 0) {
+        end = std::to_chars(digits, digits + sizeof digits, value).ptr;
+    }
+    prop_text.append(digits, static_cast<std::size_t>(end - digits));
+    return true;
 }
 
 }  // namespace
@@ -58,6 +76,7 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
         case HX_PROP_FLAG:
             if (*opened) {
                 write_pair(" ", token.view());
+                note_foreign_kind(prop);
                 return;
             }
             begin_text(*opened, token.view());
@@ -71,12 +90,18 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
                 const HX_NETWORK* net =
                     design ? design->follow_net_tag(static_cast<uint32_t>(value)) : nullptr;
                 if (net == nullptr) {
+                    if (scratch_write) return;
                     vx_write_msg(__LINE__).issueInternal(
                         "No net found for tag in %s=%d property.\n", name, value);
                     return;
                 }
                 const std::string local = section_net_name(net);
-                prop_text += vrx_legal(local.empty() ? net->get_name() : local.c_str(), net).view();
+                // An unnamed net is named as its highest signal is.
+                const void* named = net->get_highest_signal() != nullptr
+                                        ? static_cast<const void*>(net->get_highest_signal())
+                                        : net;
+                prop_text +=
+                    vrx_legal(local.empty() ? net->get_name() : local.c_str(), named).view();
             } else {
                 vx_append_int(prop_text, value);
             }
@@ -85,7 +110,8 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
         case HX_PROP_FLOAT:
             begin_text(*opened, token.view());
             prop_text += '=';
-            append_float(prop->get_float());
+            if (!append_float(prop->get_float()))
+                note_unreadable(prop_text.substr(prop_text.find_first_not_of(" (")));
             break;
         case HX_PROP_STRING:
             begin_text(*opened, token.view());
@@ -93,6 +119,7 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
             prop_text += vrx_legal(vx_text(prop->get_text()), nullptr).view();
             break;
         case HX_PROP_OBJECT:
+            if (scratch_write) return;
             vx_write_msg(__LINE__).issueWarning("Unable to write out OBJECT prop.\n");
             return;
         case HX_PROP_TIMING: {
@@ -105,6 +132,7 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
         }
         case HX_PROP_PINREF: {
             if (block == nullptr) {
+                if (scratch_write) return;
                 vx_write_msg(__LINE__).issueError(
                     "Ignoring pinref property found on non-block object\n");
                 return;
@@ -113,7 +141,11 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
             prop->get_pinref(record);
             begin_text(*opened, token.view());
             prop_text += '=';
-            prop_text += vrx_legal(Hxb_Util::form_pinref(record, block).c_str(), nullptr).view();
+            std::string value = Hxb_Util::form_pinref(record, block);
+            // An unnamed pin goes by the name invented for it where it is written.
+            if (const HX_PIN* pin = block->get_pin(record.pin); pin && !vx_present(pin->get_name()))
+                value.replace(0, value.find(','), vrx_legal(nullptr, pin).view());
+            prop_text += vrx_legal(value.c_str(), nullptr).view();
             break;
         }
         case HX_PROP_PARAM: {
@@ -137,7 +169,16 @@ void VRX::do_prop(const HX_PROPERTY* prop, uint8_t* opened, const HX_BLOCK* bloc
             return;
     }
     write_item(prop_text);
+    note_foreign_kind(prop);
     *opened = 1;
+}
+
+// The reader takes a predefined name's value as that name's kind: a value
+// of another kind is refused there, or comes back as another kind.
+void VRX::note_foreign_kind(const HX_PROPERTY* prop) {
+    HX_PROP_TYPE kind = prop->get_kind();
+    if (HX_PROPERTY::get_type(prop->get_name(), kind) && kind != prop->get_kind())
+        note_unreadable(prop->get_name());
 }
 
 // Text is read a section at a time, each as a design of its own, where only

@@ -5,10 +5,6 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
-#include <unordered_set>
-
-class HX_DESIGN;
-
 #include "port_msg.h"
 #include "vx_text.h"
 
@@ -25,16 +21,7 @@ void vx_write_fatal(int line, const char* format, ...) UT_PRINTF_FORMAT(2, 3);
 bool vx_write_fatal_seen();
 void vx_write_reset_fatal();
 
-/// The identity that invented names carry: the low 32 bits of the address.
-inline uint32_t vx_identity(const void* object) {
-    return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(object));
-}
-
-/// Adds the names of the designs that reading back the sections written for
-/// `design` makes: one per block with children, as its section is labelled.
-void vx_section_names(const HX_DESIGN& design, std::unordered_set<std::string>& names);
-
 /// Appends "OBJ_$" and the identity in lower-case hexadecimal.
-void vx_append_invented(std::string& out, const void* object);
+void vx_append_invented(std::string& out, uint32_t identity);
 /// Appends a signed decimal number.
 void vx_append_int(std::string& out, long long value);

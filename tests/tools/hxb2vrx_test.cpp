@@ -252,7 +252,7 @@ TEST_F(Hxb2vrxTest, FailedStepExits1AndLeavesNoFileBehind) {
     EXPECT_TRUE(tmp_.entries().empty());
 }
 
-TEST_F(Hxb2vrxTest, FatalErrorEndsTheRunWithoutOutputOrTemporaryFile) {
+TEST_F(Hxb2vrxTest, AValueNoTextCanCarryIsRefusedAsCorruptWithoutOutputOrTemporaryFile) {
     HX_LIBRARY* library = hx_env.create_library("work", 0);
     HX_DESIGN* design = library->create_design("top");
     HX_LOGBLOCK* root = design->create_logblock(nullptr, 1, "top");
@@ -264,8 +264,9 @@ TEST_F(Hxb2vrxTest, FatalErrorEndsTheRunWithoutOutputOrTemporaryFile) {
     ScratchDir::write_file(output, "previous contents");
 
     const ToolRun r = run({input, output});
-    EXPECT_EQ(r.status, 2);
-    EXPECT_EQ(r.err, "FATAL_ERROR:Quorra - cannot find pin type name for pin 'a'\n");
+    EXPECT_EQ(r.status, 1);
+    EXPECT_EQ(r.err, "ERROR:HX - cannot read database file '" + input +
+                         "': corrupt (a pin direction is unknown)\n");
     EXPECT_EQ(ScratchDir::read_file(output), "previous contents");
     EXPECT_TRUE(tmp_.entries().empty());
 }

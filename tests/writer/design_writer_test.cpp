@@ -98,7 +98,7 @@ DESIGN d {
    }
 }
 )",
-                           {{"<same>", obj(same)}, {"<anon>", obj(unnamed)}}));
+                           {{"<same>", "OBJ_$1"}, {"<anon>", "OBJ_$2"}}));
 }
 
 TEST_F(DesignWriterTest, ChildrenKeepTheirOrderInEveryList) {
@@ -189,7 +189,7 @@ DESIGN d (P=1 F) {
    }
 }
 )",
-                    {{"<user>", user}, {"<pin>", obj(top_pin)}, {"<sig>", obj(unnamed)}});
+                    {{"<user>", user}, {"<pin>", "OBJ_$1"}, {"<sig>", "OBJ_$2"}});
     }
 
     HX_LOGBLOCK* top = nullptr;
@@ -278,7 +278,7 @@ DESIGN d {
    SIGNAL <u> (Y=1)
 }
 )",
-                           {{"<u>", obj(unnamed)}}));
+                           {{"<u>", "OBJ_$1"}}));
 }
 
 TEST_F(DesignWriterTest, SignalWhosePropertiesAreAllSkippedLeavesTheTextReadable) {

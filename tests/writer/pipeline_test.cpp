@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cmath>
 #include <memory>
 #include <regex>
 #include <string>
@@ -122,6 +123,9 @@ TEST_F(PipelineTest, FileStartsWithTheTwoHeaderLines) {
     ASSERT_TRUE(std::regex_match(written, match, layout)) << written;
     EXPECT_EQ(match[1].str(), kHeaderLine2);
     expect_pipeline_report(PORT_MSG_STATUS, "   writing VRX file '" + path + "' ...\n");
+    expect_writer_report(capture, PORT_MSG_WARNING,
+                         "design d has no root block; text cannot hold such a design, so the text "
+                         "written will not read back\n");
     EXPECT_EQ(errors(), std::vector<std::string>{});
     expect_untouched(path, written.c_str());
 }
@@ -132,14 +136,18 @@ TEST_F(PipelineTest, NamesThatWillNotReadBackAreCountedInOneWarning) {
     name_pin(top, 0, "a\"b", HX_PIN_IN);
     name_pin(top, 1, std::string(1025, 'n').c_str(), HX_PIN_IN);
     name_pin(top, 2, "cr\r\nlf", HX_PIN_IN);
+    HX_LOGBLOCK* c = design->create_logblock(top, 0, "c");
+    c->create_prop(HX_PROPERTY::make_float("CAP", -INFINITY), nullptr);
+    c->create_prop(HX_PROPERTY::make_float("DRIVE", 1), nullptr);  // an integer on reading
     select_design();
     const std::string path = dir.file("out.vrx");
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
     expect_pipeline_report(PORT_MSG_WARNING,
-                           "3 name(s) in '" + path +
+                           "5 name(s) in '" + path +
                                "' will not read back as written (a double quote, a carriage "
-                               "return before a line feed, or more than 1024 bytes), the first "
-                               "'a\"b'\n");
+                               "return before a line feed, more than 1024 bytes, a float that "
+                               "is not finite, or a value of another kind than its property's "
+                               "name takes), the first 'a\"b'\n");
     capture.clear();
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);  // counted afresh
     EXPECT_EQ(capture.texts(PORT_MSG_WARNING).size(), 1u);
@@ -205,6 +213,48 @@ DESIGN d2 "also d2" {
     ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
     const std::string header_only = ScratchDir::read_file(path);
     EXPECT_EQ(header_only.substr(header_only.find("\r\n") + 2), kHeaderLine2);
+    expect_pipeline_report(PORT_MSG_WARNING,
+                           "library E holds no design; text cannot hold an "
+                           "empty library, so the text written will not read "
+                           "back\n");
+    A::library(vrx) = nullptr;
+}
+
+TEST_F(PipelineTest, ALibraryDesignIsLeftOutOnlyWhereTheSectionOfItsNameHoldsItWhole) {
+    HX_LIBRARY lib("L", 0);
+    HX_DESIGN* part = lib.create_design("top/u1");
+    HX_LOGBLOCK* root = part->create_logblock(nullptr, 1, "top/u1");
+    name_pin(root, 0, "z", HX_PIN_OUT);
+    HX_SIGNAL* z = part->create_signal(root, "z");
+    HX_LOGPRIM* one = part->create_logprim(root, HX_PRIM_ONE, 0, "c");
+    ASSERT_TRUE(part->create_conn(z, root, 0) && part->create_conn(z, one, 0));
+    HX_DESIGN* whole = lib.create_design("TOP");
+    HX_LOGBLOCK* u1 = whole->create_logblock(whole->create_logblock(nullptr, 0, "top"), 1, "u1");
+    name_pin(u1, 0, "z", HX_PIN_OUT);
+    ASSERT_NE(whole->graft(u1, part, 0, 0, nullptr, 0), nullptr);
+    A::library(vrx) = &lib;
+    A::is_design(vrx) = 0;
+    const std::string path = dir.file("l.vrx");
+    const auto sections = [&] {
+        const std::string written = ScratchDir::read_file(path);
+        const std::regex header("DESIGN top/u1 \\{");
+        return std::distance(std::sregex_iterator(written.begin(), written.end(), header), {});
+    };
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
+    EXPECT_EQ(sections(), 1);
+    expect_pipeline_report(PORT_MSG_STATUS,
+                           "   design top/u1 is written as a section of another design\n");
+    EXPECT_EQ(capture.texts(PORT_MSG_WARNING), std::vector<std::string>{});
+
+    one->set_name("other");  // the library's design no longer is what the section holds
+    capture.clear();
+    ASSERT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_OK);
+    EXPECT_EQ(sections(), 2);
+    EXPECT_EQ(capture.texts(PORT_MSG_WARNING),
+              std::vector<std::string>{
+                  "design top/u1 differs from the section of design TOP written under the same "
+                  "name: the text holds two designs of that name and will not read back as "
+                  "written\n"});
     A::library(vrx) = nullptr;
 }
 

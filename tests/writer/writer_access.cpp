@@ -1,6 +1,5 @@
 #include "writer_access.h"
 
-#include <cinttypes>
 #include <cstdio>
 
 Port::Stream*& VRX_TEST_ACCESS::out_stream(VRX& v) {
@@ -69,13 +68,6 @@ std::string text(std::string lines, const Substitutions& subs) {
         out += c;
     }
     return out;
-}
-
-std::string obj(const void* object) {
-    char name[32];
-    std::snprintf(name, sizeof name, "OBJ_$%" PRIx32,
-                  static_cast<uint32_t>(reinterpret_cast<uintptr_t>(object)));
-    return name;
 }
 
 HX_PIN* name_pin(HX_BLOCK* block, uint16_t index, const char* name, uint8_t dir) {

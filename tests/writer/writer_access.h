@@ -42,8 +42,6 @@ using Substitutions = std::vector<std::pair<std::string, std::string>>;
 /// Expected output: `lines` without its first line feed, each "\n" made
 /// "\r\n", and each key of `subs` replaced by its value.
 std::string text(std::string lines, const Substitutions& subs = {});
-/// The invented name of an unnamed object: "OBJ_$" and its identity.
-std::string obj(const void* object);
 /// Names pin `index` of `block` and gives it direction `dir`.
 HX_PIN* name_pin(HX_BLOCK* block, uint16_t index, const char* name, uint8_t dir);
 

@@ -1028,8 +1028,9 @@ class HX_FILE_IO::Decoder {
         }
     }
 
-    void note_props(uint8_t flags, HX_OBJECT* object) {
-        if (flags & kProps) with_props_.push_back(object);
+    /// `pin_block`: the block of a pin, whose pin references name its pins.
+    void note_props(uint8_t flags, HX_OBJECT* object, const HX_BLOCK* pin_block = nullptr) {
+        if (flags & kProps) with_props_.push_back(PropOwner{object, pin_block});
     }
 
     void design_record() {
@@ -1113,8 +1114,9 @@ class HX_FILE_IO::Decoder {
         pin.mapinv_ = u8();
         pin.inverted_ = u8();
         if ((flags & ~(kProps | kNamed)) != 0) corrupt("bad pin record");
+        if (pin.dir_ > HX_PIN_BI) corrupt("a pin direction is unknown");
         if (flags & kNamed) pin.name_ = design.intern(text());
-        note_props(flags, &pin);
+        note_props(flags, &pin, pin.get_block());
     }
 
     void signal_records(DesignObjects& objects) {
@@ -1369,16 +1371,16 @@ class HX_FILE_IO::Decoder {
 
     void property_section() {
         in_chunks(static_cast<uint32_t>(with_props_.size()), [&](uint32_t k) {
-            HX_OBJECT* object = with_props_[k];
+            HX_OBJECT* object = with_props_[k].object;
             const uint32_t n = count(kMinProp);
             if (n == 0) corrupt("an empty property list");
             for (uint32_t i = 0; i < n; ++i)
-                object->create_prop(property(), nullptr);
+                object->create_prop(property(with_props_[k].pin_block), nullptr);
             if (object->prop_count() != static_cast<int>(n)) corrupt("a property name repeats");
         });
     }
 
-    std::unique_ptr<HX_PROPERTY> property() {
+    std::unique_ptr<HX_PROPERTY> property(const HX_BLOCK* pin_block) {
         const char* name = text();
         const uint8_t kind = u8();
         if (name == nullptr) corrupt("a property has no name");
@@ -1403,7 +1405,7 @@ class HX_FILE_IO::Decoder {
             case HX_PROP_TIMING:
                 return HX_PROPERTY::make_timing(name, timing());
             case HX_PROP_PINREF:
-                return HX_PROPERTY::make_pinref(name, pinref());
+                return HX_PROPERTY::make_pinref(name, pinref(pin_block));
             default:
                 corrupt("unknown property kind");
         }
@@ -1415,22 +1417,34 @@ class HX_FILE_IO::Decoder {
         return value;
     }
 
+    int32_t time_unit() {
+        const int32_t unit = i32();
+        if (unit < HX_UNIT_PS || unit > HX_UNIT_NONE) corrupt("a time unit is unknown");
+        return unit;
+    }
+
     HX_PROP_TIMING_DATA timing() {
         HX_PROP_TIMING_DATA record;
         record.min = i32();
         record.max = i32();
-        record.unit = i32();
+        record.unit = time_unit();
         return record;
     }
 
-    HX_PROP_PINREF_DATA pinref() {
+    /// A pin reference on a pin names a pin of the same block.
+    HX_PROP_PINREF_DATA pinref(const HX_BLOCK* pin_block) {
         HX_PROP_PINREF_DATA record;
         record.min = i32();
         record.max = i32();
-        record.unit = i32();
+        record.unit = time_unit();
         record.pin = u16();
         record.edge = i32();
         record.inverted = u8();
+        if (record.edge != HX_EDGE_RISING && record.edge != HX_EDGE_FALLING &&
+            record.edge != HX_EDGE_NONE)
+            corrupt("a clock edge is unknown");
+        if (pin_block != nullptr && record.pin >= pin_block->get_pin_count())
+            corrupt("a pin reference names a pin its block does not have");
         return record;
     }
 
@@ -1480,7 +1494,11 @@ class HX_FILE_IO::Decoder {
     const uint8_t* begin_;
     std::unique_ptr<HX_LIBRARY> library_;
     std::vector<DesignObjects> designs_;
-    std::vector<HX_OBJECT*> with_props_;
+    struct PropOwner {
+        HX_OBJECT* object;
+        const HX_BLOCK* pin_block;
+    };
+    std::vector<PropOwner> with_props_;
     Ahead ahead_;
 };
 

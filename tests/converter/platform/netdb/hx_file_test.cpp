@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -476,6 +477,39 @@ TEST(HxFile, InconsistentContentIsRefusedWithItsReason) {
     reseal(zero_version);
     EXPECT_EQ(refusals_of(path, zero_version),
               std::vector<std::string>{refusal(path, "corrupt (bad header)")});
+}
+
+TEST(HxFile, ValuesThatNameNothingAreRefused) {
+    const auto pinref = [](uint16_t pin, int32_t edge) {
+        HX_PROP_PINREF_DATA record;
+        record.pin = pin;
+        record.edge = edge;
+        return HX_PROPERTY::make_pinref("CLKREF", record);
+    };
+    const std::pair<std::function<void(HX_BLOCK*)>, std::string> cases[] = {
+        {[&](HX_BLOCK* b) { b->get_pin(1)->create_prop(pinref(0, HX_EDGE_FALLING), nullptr); }, ""},
+        {[](HX_BLOCK* b) { b->get_pin(0)->set_dir(HX_PIN_BI + 1); }, "a pin direction is unknown"},
+        {[&](HX_BLOCK* b) { b->get_pin(1)->create_prop(pinref(2, HX_EDGE_RISING), nullptr); },
+         "a pin reference names a pin its block does not have"},
+        {[&](HX_BLOCK* b) { b->get_pin(1)->create_prop(pinref(0, 2), nullptr); },
+         "a clock edge is unknown"},
+        {[](HX_BLOCK* b) {
+             b->create_prop(HX_PROPERTY::make_timing("SETUP", {1, 2, 4}), nullptr);
+         },
+         "a time unit is unknown"},
+    };
+    for (const auto& [change, reason] : cases) {
+        HX_LIBRARY library("lib", 0);
+        HX_DESIGN* design = library.create_design("d");
+        HX_LOGBLOCK* top = design->create_logblock(nullptr, 2, "top");
+        top->get_pin(0)->set_name("clk");
+        change(top);
+        const std::string bytes = HX_FILE_IO::encode(*design);
+        std::string refusal;
+        const auto read = HX_FILE_IO::decode(bytes.data(), bytes.size(), HX_FILE_DESIGN, refusal);
+        EXPECT_EQ(read == nullptr, !reason.empty()) << reason;
+        EXPECT_EQ(refusal, reason.empty() ? "" : "corrupt (" + reason + ")");
+    }
 }
 
 TEST(HxFile, FilesOfTheOtherKindOrANewerVersionAreRefused) {
