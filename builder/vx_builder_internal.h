@@ -31,7 +31,14 @@ bool VRX::assign_name(Named* object, const VX_PROP& prop) {
 }
 
 /// The builder's keyed lookups and the designs whose merge records wait.
+/// A regular file that was read, so that no write replaces it.
+struct VX_INPUT_FILE {
+    Port::FileId id;
+    std::string name;
+};
+
 struct VX_LOOKUPS {
+    std::vector<VX_INPUT_FILE> inputs;
     VX_BLOCK_INDEX blocks;
     VX_NET_INDEX nets;
     std::vector<HX_DESIGN*> merge_pending;  // in the order their first record came

@@ -157,7 +157,7 @@ class VRX {
         if (progress_fn != nullptr)
             progress_fn(progress_context, progress_what.c_str(), done, total);
     }
-    void report_write_progress(const char* file, bool complete);
+    void report_write_progress(bool complete);
     static void forward_progress(void* self, uint64_t done, uint64_t total);
     static void forward_scan_progress(void* self, uint64_t done);
 
@@ -226,7 +226,8 @@ class VRX {
     // Database to text: the top of the file and the library.
     void write_file_header();
     void write_library();
-    VX_STATUS finish_write(const char* path, const char* temp_name);
+    VX_STATUS finish_write(const char* path, Port::ReplaceFile& out);
+    bool is_an_input(const char* output) const;
 
     // Output layer: every byte of a written netlist passes through here.
     // An absent word of write_indent is a view without data.

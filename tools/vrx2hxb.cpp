@@ -49,6 +49,8 @@ constexpr vrx_tool::ToolInfo kInfo = {
     "design they define as a design file (.hxb), or with -l the whole library as a library\n"
     "file (.hxl). An INPUT without an extension is read with \".vrx\" added. The output is\n"
     "named after the first INPUT unless -o names it; its extension is set to .hxb or .hxl.\n"
+    "\"-\" as INPUT reads standard input (name the output with -o then). An output that is\n"
+    "one of the inputs is refused.\n"
     "No output is written after a file or parse error; after design-rule errors it is.\n"
     "On a terminal, standard error shows how far each step has come.\n"
     "\n"
@@ -124,5 +126,6 @@ int convert(const Settings& settings) {
 int main(int argc, char** argv) {
     const vrx_tool::CommandLine line = vrx_tool::parse_command_line(argc, argv, kOptions, kInfo);
     if (line.exit_status) return *line.exit_status;
+    Port::guard_temporary_files();
     return convert(settings_from(line));
 }
