@@ -215,10 +215,21 @@ bool VRX::check() {
 
 namespace {
 
+// "-" and an existing device, FIFO or socket are written as named.
+bool written_as_named(const char* path) {
+    struct stat st;
+    return std::strcmp(path, "-") == 0 ||
+           (::stat(path, &st) == 0 && !S_ISREG(st.st_mode) && !S_ISDIR(st.st_mode));
+}
+
 // The output name: `path`, or the first input without its extension; the
 // extension is made the one of what is written.
 bool output_name(const char* path, const char* first_input, const char* extension,
                  std::string& out) {
+    if (path != nullptr && *path != '\0' && written_as_named(path)) {
+        out = path;
+        return true;
+    }
     if (path != nullptr && *path != '\0')
         out = path;
     else if (path == nullptr && first_input != nullptr && *first_input != '\0' &&
