@@ -215,8 +215,8 @@ bool VRX::is_an_input(const char* output) const {
     for (const VX_INPUT_FILE& input : lookups->inputs) {
         if (input.id != *id) continue;
         write_msg(__LINE__).issueError(
-            "output file '%s' is the same file as input file '%s'; nothing was written\n",
-            output, input.name.c_str());
+            "output file '%s' is the same file as input file '%s'; nothing was written\n", output,
+            input.name.c_str());
         return true;
     }
     return false;

@@ -168,8 +168,8 @@ VX_STATUS VRX::vrx_read(const DARRAY_NAME& names, uint8_t design_flag, uint8_t p
 }
 
 VX_STATUS VRX::read_one_file(const char* name) {
-    const std::string path = takes_name_as_given(name) ? std::string(name)
-                                                       : UT_STR::Format("%s.vrx", name);
+    const std::string path =
+        takes_name_as_given(name) ? std::string(name) : UT_STR::Format("%s.vrx", name);
     const InputFile input(path.c_str());
     if (!usable(input, path.c_str())) return VX_FILE_ERROR;
     if (const auto id = Port::regular_file_id(path.c_str(), true))
@@ -264,8 +264,7 @@ VX_STATUS VRX::hxb_write(const char* path) {
     }
     if (path != nullptr && UT_PATH::GetExt(path) != nullptr && out != path) {
         read_msg(__LINE__).issueWarning(
-            "output file %s is written as %s, with the extension of its kind\n", path,
-            out.c_str());
+            "output file %s is written as %s, with the extension of its kind\n", path, out.c_str());
     }
     if (is_an_input(out.c_str())) return VX_FILE_ERROR;
     resolve_merge_props();  // records of a file that failed to parse

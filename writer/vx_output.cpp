@@ -261,8 +261,7 @@ void VRX::begin_construct() {
 void VRX::end_construct() {
     --indent;
     write_indent(2, "}", "\r\n");
-    if ((++constructs_written & (kConstructsPerReport - 1)) == 0)
-        report_write_progress(false);
+    if ((++constructs_written & (kConstructsPerReport - 1)) == 0) report_write_progress(false);
 }
 
 // The size is what left the stream's buffer so far; once the file is

@@ -166,6 +166,7 @@ TEST_F(ToolFilesTest, FailuresSayWhyAndLeaveTheDestinationAlone) {
          "cannot open input file sub: sub is a directory"},
         {"$VRX2HXB -q -o out.hxb top.hxb", "input file top.hxb is a design or library file"},
         {"$HXB2VRX -q top.hxb sub", "cannot open temporary output file 'sub': Is a directory"},
+        {"$HXB2VRX -q top.hxb /dev/full", "/dev/full': No space left on device"},
     };
     if (::geteuid() != 0) {
         rows.push_back(

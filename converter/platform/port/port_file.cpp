@@ -10,8 +10,8 @@
 #include <climits>
 #include <csignal>
 #include <cstdlib>
-#include <ctime>
 #include <cstring>
+#include <ctime>
 
 #include "port_msg.h"
 #include "ut_ptrfile.h"
@@ -457,19 +457,18 @@ void ReplaceFile::discard() {
 std::optional<FileId> regular_file_id(const char* path, bool input) {
     if (path == nullptr) return std::nullopt;
     struct stat st;
-    const int got = std::strcmp(path, "-") == 0
-                        ? ::fstat(input ? STDIN_FILENO : STDOUT_FILENO, &st)
-                        : ::stat(path, &st);
+    const int got = std::strcmp(path, "-") == 0 ? ::fstat(input ? STDIN_FILENO : STDOUT_FILENO, &st)
+                                                : ::stat(path, &st);
     if (got != 0 || !S_ISREG(st.st_mode)) return std::nullopt;
     return FileId{st.st_dev, st.st_ino};
 }
 
 void guard_temporary_files() {
-    struct sigaction action{};
+    struct sigaction action {};
     action.sa_handler = remove_temporaries_and_die;
     sigemptyset(&action.sa_mask);
     for (const int signal_number : {SIGINT, SIGTERM, SIGHUP}) {
-        struct sigaction former{};
+        struct sigaction former {};
         // A signal ignored by whoever started the process (nohup) stays ignored.
         if (::sigaction(signal_number, nullptr, &former) == 0 && former.sa_handler == SIG_IGN)
             continue;
