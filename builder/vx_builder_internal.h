@@ -31,11 +31,18 @@ bool VRX::assign_name(Named* object, const VX_PROP& prop) {
     return true;
 }
 
+/// A regular file that was read, so that no write replaces it.
+struct VX_INPUT_FILE {
+    Port::FileId id;
+    std::string name;
+};
+
 /// The builder's keyed lookups, the designs whose merge records wait, and
 /// which design was grafted into which. Designs are counted in library order:
 /// those read before the current file, and before the file of the last
 /// DESIGN statement.
 struct VX_LOOKUPS {
+    std::vector<VX_INPUT_FILE> inputs;
     VX_BLOCK_INDEX blocks;
     VX_NET_INDEX nets;
     std::vector<HX_DESIGN*> merge_pending;  // in the order their first record came

@@ -1,13 +1,14 @@
 // Database to text: loading a design or library file, and writing it as a
 // text netlist.
 //
-// vrx_write writes into a temporary file and copies it to the destination
-// only when the whole file was written without error, so the destination
-// holds either its former content or a complete netlist. Every failure
-// removes the temporary file.
+// vrx_write writes into a temporary file beside the destination and puts it
+// in place only when the whole file was written without error, so the
+// destination holds either its former content or a complete netlist. Every
+// failure drops the temporary file.
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <ctime>
 #include <memory>
 #include <string>
 
@@ -29,31 +30,33 @@ Port_MsgManData write_msg(int line) {
     return Port_MsgManData::createObject("Quorra", "../s/basvrxwrite", line, "$Revision: 1.1 $");
 }
 
-// The temporary file of the write in progress. A fatal report that ends the
-// process while it exists would leave it behind; the exit hook removes it.
-std::string pending_temp;
-
-void remove_pending_temp() {
-    if (!pending_temp.empty()) std::remove(pending_temp.c_str());
+// A file whose first byte is printable text (or starts a byte-order mark) is
+// taken for a text netlist given by mistake. Only a regular file is opened
+// again to look: a pipe has been read.
+bool looks_like_text(const char* path) {
+    if (std::strcmp(path, "-") == 0 || !Port::regular_file_id(path, true)) return false;
+    UT_PTRFILE file(Port::ACCESS_READ);
+    unsigned char first = 0;
+    if (Port::File::open(path, &file, true) == nullptr || file.read(&first, 1) != 1) return false;
+    return first == 0xEF || first == '\t' || first == '\n' || first == '\r' ||
+           (first >= 0x20 && first < 0x7F);
 }
 
-void track_temp(const char* name) {
-    static const bool hooked = std::atexit(remove_pending_temp) == 0;
-    (void)hooked;
-    pending_temp = name;
-}
-
-// Removes the temporary file and stops tracking it; false when it stays.
-bool remove_temp(const char* temp_name) {
-    pending_temp.clear();
-    return Port::File::remove(temp_name);
-}
-
-// Closes the stream, removes the temporary file, forgets both.
-void discard_output(Port::Stream*& stream, const char* temp_name) {
-    delete stream;  // closes without reporting
-    stream = nullptr;
-    remove_temp(temp_name);
+// The header's time: SOURCE_DATE_EPOCH in UTC when it is set, so that two runs
+// give the same bytes; else now, in local time.
+UT_TIMESTAMP header_time() {
+    const char* epoch = std::getenv("SOURCE_DATE_EPOCH");
+    if (epoch == nullptr || *epoch == '\0') return UT_TIMESTAMP();
+    char* end = nullptr;
+    errno = 0;
+    const long long seconds = std::strtoll(epoch, &end, 10);
+    if (errno != 0 || *end != '\0' || seconds < 0) {
+        write_msg(__LINE__).issueWarning(
+            "SOURCE_DATE_EPOCH '%s' is not a count of seconds; the current time is written\n",
+            epoch);
+        return UT_TIMESTAMP();
+    }
+    return UT_TIMESTAMP(static_cast<std::time_t>(seconds), UT_TIMESTAMP::UTC);
 }
 
 }  // namespace
@@ -69,9 +72,16 @@ VX_STATUS VRX::hxb_read(const char* path) {
     delete db_file;
     db_file = new UT_PTRFILE(Port::ACCESS_READ);
     if (Port::File::open(path, db_file, true) == nullptr) {
-        write_msg(__LINE__).issueError("cannot open input file '%s'\n", path);
+        const int error = errno;
+        if (error == EISDIR)
+            write_msg(__LINE__).issueError("cannot open input file '%s': '%s' is a directory\n",
+                                           path, path);
+        else
+            write_msg(__LINE__).issueError("cannot open input file '%s': %s\n", path,
+                                           std::strerror(error));
         return VX_FILE_ERROR;
     }
+    if (const auto id = Port::regular_file_id(path, true)) lookups->inputs.push_back({*id, path});
     VX_STATUS status = VX_OK;
     begin_progress("reading", path);
     const VX_PROGRESS_HOOKS_OFF hooks_off;
@@ -97,7 +107,9 @@ VX_STATUS VRX::hxb_read(const char* path) {
             break;
         default:
             write_msg(__LINE__).issueError(
-                "input file '%s' is neither a design nor a library file\n", path);
+                "input file '%s' is neither a design nor a library file%s\n", path,
+                looks_like_text(path) ? " (it holds text: a VRX netlist is converted by vrx2hxb)"
+                                      : "");
             status = VX_FILE_ERROR;
             break;
     }
@@ -118,23 +130,7 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
         write_msg(__LINE__).issueError("no output file name given\n");
         return VX_FILE_ERROR;
     }
-    delete out_stream;
-    out_stream = new Port::Stream(Port::ACCESS_WRITE, 4096);
-    const char* temp = Port::File::tmpnam();
-    if (temp == nullptr) {
-        write_msg(__LINE__).issueError("cannot open temporary output file '%s'\n",
-                                       "(no temporary file could be made)");
-        delete out_stream;
-        out_stream = nullptr;
-        return VX_FILE_ERROR;
-    }
-    const std::unique_ptr<char[]> temp_name(UT_STR::Dup(temp));
-    track_temp(temp_name.get());
-    if (Port::File::open(temp_name.get(), out_stream, true) == nullptr) {
-        write_msg(__LINE__).issueError("cannot open temporary output file '%s'\n", temp_name.get());
-        discard_output(out_stream, temp_name.get());
-        return VX_FILE_ERROR;
-    }
+    if (is_an_input(path)) return VX_FILE_ERROR;
     if (filter_file != nullptr) {
         // A filter that fails to read replaces nothing: an earlier filter stays.
         Hxb_PropFiltStatus filter_status = HXB_PROPFILT_NOT_READ;
@@ -143,12 +139,22 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
         if (filter_status != 3) {
             write_msg(__LINE__).issueError("error reading property filter file '%s'\n",
                                            filter_file);
-            discard_output(out_stream, temp_name.get());
             return VX_FILE_ERROR;
         }
         delete prop_filter;
         prop_filter = filter.release();
     }
+    // The text is written once, beside the destination, and put in place whole.
+    Port::ReplaceFile out;
+    if (!out.create(path)) {
+        const int error = errno;
+        write_msg(__LINE__).issueError("cannot open temporary output file '%s': %s\n", path,
+                                       std::strerror(error));
+        return VX_FILE_ERROR;
+    }
+    delete out_stream;
+    out_stream = new Port::Stream(Port::ACCESS_WRITE, 4096);
+    out_stream->attach(out.fd(), out.temp_name().c_str(), false);
     write_msg(__LINE__).issueStatus("   writing VRX file '%s' ...\n", path);
     begin_progress("writing", path);
 
@@ -164,27 +170,31 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
         write_design();
     else
         write_library();
-    const VX_STATUS status = finish_write(path, temp_name.get());
+    const VX_STATUS status = finish_write(path, out);
     std::unordered_map<const void*, uint32_t>().swap(invented_ids);
     return status;
 }
 
-// Closes the temporary file and puts it in place when it is whole.
-VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
-    const int stream_error = out_stream->error();
-    const bool closed = Port::File::close(out_stream);
-    const int error = stream_error != 0 ? stream_error : out_stream->error();
+// Puts the written text in place when it is whole; else drops it.
+VX_STATUS VRX::finish_write(const char* path, Port::ReplaceFile& out) {
+    const bool flushed = out_stream->detach();
+    const int error = out_stream->error();
+    const std::string shown = out.temp_name();
     if (vx_write_fatal_seen()) {  // the report said why; the text is incomplete
-        discard_output(out_stream, temp_name);
+        delete out_stream;
+        out_stream = nullptr;
         return VX_FILE_ERROR;
     }
-    if (!closed) {
-        write_msg(__LINE__).issueError("error writing temporary output file '%s': %s\n", temp_name,
-                                       std::strerror(error != 0 ? error : EIO));
-        discard_output(out_stream, temp_name);
+    if (!flushed) {
+        write_msg(__LINE__).issueError("error writing temporary output file '%s': %s\n",
+                                       shown.c_str(), std::strerror(error != 0 ? error : EIO));
+        delete out_stream;
+        out_stream = nullptr;
         return VX_FILE_ERROR;
     }
-    report_write_progress(temp_name, true);
+    report_write_progress(true);
+    delete out_stream;
+    out_stream = nullptr;
     if (unreadable_names > 0) {
         write_msg(__LINE__).issueWarning(
             "%u name(s) in '%s' will not read back as written (a double quote, a carriage "
@@ -192,23 +202,31 @@ VX_STATUS VRX::finish_write(const char* path, const char* temp_name) {
             "value of another kind than its property's name takes), the first '%.80s'\n",
             unreadable_names, path, first_unreadable.c_str());
     }
-    if (!Port::File::copy(temp_name, path)) {
-        write_msg(__LINE__).issueError("Unable to copy temporary file '%s' to '%s'.\n", temp_name,
-                                       path);
-        discard_output(out_stream, temp_name);
-        return VX_FILE_ERROR;
-    }
-    delete out_stream;
-    out_stream = nullptr;
-    if (!remove_temp(temp_name)) {
-        write_msg(__LINE__).issueError("Unable to remove temporary file '%s'.\n", temp_name);
+    if (!out.commit()) {
+        const int failure = errno;
+        write_msg(__LINE__).issueError("Unable to copy temporary file '%s' to '%s': %s\n",
+                                       shown.c_str(), path, std::strerror(failure));
         return VX_FILE_ERROR;
     }
     return VX_OK;
 }
 
+// An output that is one of the files read would destroy what it is made from.
+bool VRX::is_an_input(const char* output) const {
+    const auto id = Port::regular_file_id(output, false);
+    if (!id) return false;
+    for (const VX_INPUT_FILE& input : lookups->inputs) {
+        if (input.id != *id) continue;
+        write_msg(__LINE__).issueError(
+            "output file '%s' is the same file as input file '%s'; nothing was written\n", output,
+            input.name.c_str());
+        return true;
+    }
+    return false;
+}
+
 void VRX::write_file_header() {
-    const UT_TIMESTAMP now;
+    const UT_TIMESTAMP now = header_time();
     const std::string stamp = UT_STR::Format(
         "%s:%s:%s, %s %s, %s.", now.get_ts_hour(), now.get_ts_minute(), now.get_ts_second(),
         now.get_ts_monthst(), now.get_ts_mday(), now.get_ts_year());

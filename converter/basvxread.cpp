@@ -11,7 +11,13 @@
 //    reported and dropped) by hxb_write, so none reaches a database file.
 //  - hxb_write checks the database write and the close; the destination is
 //    replaced only by a complete file.
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
 #include <cstdio>
+#include <cstring>
 #include <filesystem>
 #include <memory>
 #include <string>
@@ -41,25 +47,85 @@ Port_MsgManData read_msg(int line) {
     return Port_MsgManData::createObject("Quorra", "../s/basvxread", line, "$Revision: 1.2 $");
 }
 
-// The scanner's input for one file; closed and taken back from the scanner
-// on every way out.
+// The scanner's input for one file ("-": standard input); closed and taken
+// back from the scanner on every way out. A directory or a database file is
+// refused before the scanner sees it.
 class InputFile {
   public:
-    explicit InputFile(const char* path) : file_(std::fopen(path, "r")) {
-        if (file_ != nullptr) vrx_set_input(file_);
+    enum Kind { TEXT, UNREADABLE, DIRECTORY, DATABASE };
+
+    explicit InputFile(const char* path) : file_(open_stream(path)) {
+        if (file_ == nullptr) {
+            error_ = errno;
+            return;
+        }
+        struct stat st;
+        if (::fstat(fileno(file_), &st) == 0 && S_ISDIR(st.st_mode)) {
+            kind_ = DIRECTORY;
+        } else if (const int first = std::getc(file_); first == kDatabaseByte) {
+            kind_ = DATABASE;
+        } else if (first != EOF) {
+            std::ungetc(first, file_);
+        }
+        if (kind_ == TEXT) vrx_set_input(file_);
     }
     ~InputFile() {
         if (file_ == nullptr) return;
-        vrx_set_input(nullptr);
+        if (kind_ == TEXT) vrx_set_input(nullptr);
         std::fclose(file_);
     }
     InputFile(const InputFile&) = delete;
     InputFile& operator=(const InputFile&) = delete;
-    bool is_open() const { return file_ != nullptr; }
+    Kind kind() const { return file_ == nullptr ? UNREADABLE : kind_; }
+    int error() const { return error_; }
 
   private:
+    // Design and library files begin with this byte, which no text does.
+    static constexpr int kDatabaseByte = 0x89;
+
+    static std::FILE* open_stream(const char* path) {
+        if (std::strcmp(path, "-") != 0) return std::fopen(path, "re");
+        const int fd = ::fcntl(STDIN_FILENO, F_DUPFD_CLOEXEC, 3);
+        std::FILE* stream = fd >= 0 ? ::fdopen(fd, "r") : nullptr;
+        if (stream == nullptr && fd >= 0) ::close(fd);
+        return stream;
+    }
+
     std::FILE* file_;
+    Kind kind_ = TEXT;
+    int error_ = 0;
 };
+
+// Says why an input cannot be read as text.
+bool usable(const InputFile& input, const char* path) {
+    switch (input.kind()) {
+        case InputFile::TEXT:
+            return true;
+        case InputFile::UNREADABLE:
+            read_msg(__LINE__).issueError("cannot open input file %s: %s\n", path,
+                                          std::strerror(input.error()));
+            return false;
+        case InputFile::DIRECTORY:
+            read_msg(__LINE__).issueError("cannot open input file %s: %s is a directory\n", path,
+                                          path);
+            return false;
+        case InputFile::DATABASE:
+            read_msg(__LINE__).issueError(
+                "input file %s is a design or library file, not a VRX text netlist (hxb2vrx "
+                "converts it)\n",
+                path);
+            return false;
+    }
+    return false;
+}
+
+// "-" and a directory (refused as such) keep their name; another name
+// without an extension gets ".vrx".
+bool takes_name_as_given(const char* name) {
+    struct stat st;
+    return UT_PATH::GetExt(name) != nullptr || std::strcmp(name, "-") == 0 ||
+           (::stat(name, &st) == 0 && S_ISDIR(st.st_mode));
+}
 
 // 0 when the size is not known (a pipe, say).
 uint64_t file_size(const char* path) {
@@ -111,12 +177,11 @@ VX_STATUS VRX::vrx_read(const DARRAY_NAME& names, uint8_t design_flag, uint8_t p
 
 VX_STATUS VRX::read_one_file(const char* name) {
     const std::string path =
-        UT_PATH::GetExt(name) != nullptr ? std::string(name) : UT_STR::Format("%s.vrx", name);
+        takes_name_as_given(name) ? std::string(name) : UT_STR::Format("%s.vrx", name);
     const InputFile input(path.c_str());
-    if (!input.is_open()) {
-        read_msg(__LINE__).issueError("cannot open input file %s\n", path.c_str());
-        return VX_FILE_ERROR;
-    }
+    if (!usable(input, path.c_str())) return VX_FILE_ERROR;
+    if (const auto id = Port::regular_file_id(path.c_str(), true))
+        lookups->inputs.push_back({*id, path});
     read_msg(__LINE__).issueStatus("reading VRX file %s ...\n", path.c_str());
     parser_status = VX_PARSER_OK;
     lookups->designs_before_file = library->design_count();
@@ -218,13 +283,25 @@ bool VRX::check() {
 
 namespace {
 
+// "-" and an existing device, FIFO or socket are written as named.
+bool written_as_named(const char* path) {
+    struct stat st;
+    return std::strcmp(path, "-") == 0 ||
+           (::stat(path, &st) == 0 && !S_ISREG(st.st_mode) && !S_ISDIR(st.st_mode));
+}
+
 // The output name: `path`, or the first input without its extension; the
 // extension is made the one of what is written.
 bool output_name(const char* path, const char* first_input, const char* extension,
                  std::string& out) {
+    if (path != nullptr && *path != '\0' && written_as_named(path)) {
+        out = path;
+        return true;
+    }
     if (path != nullptr && *path != '\0')
         out = path;
-    else if (path == nullptr && first_input != nullptr && *first_input != '\0')
+    else if (path == nullptr && first_input != nullptr && *first_input != '\0' &&
+             std::strcmp(first_input, "-") != 0)
         UT_PATH::GetRoot(first_input, out);
     else
         return false;
@@ -253,11 +330,17 @@ VX_STATUS VRX::hxb_write(const char* path) {
                                       out.c_str());
         return VX_FILE_ERROR;
     }
+    if (path != nullptr && UT_PATH::GetExt(path) != nullptr && out != path) {
+        read_msg(__LINE__).issueWarning(
+            "output file %s is written as %s, with the extension of its kind\n", path, out.c_str());
+    }
+    if (is_an_input(out.c_str())) return VX_FILE_ERROR;
     resolve_merge_props();  // records of a file that failed to parse
     delete db_file;
     db_file = new UT_PTRFILE(Port::ACCESS_WRITE);
     if (Port::File::open(out.c_str(), db_file, true) == nullptr) {
-        read_msg(__LINE__).issueError("cannot open output file %s\n", out.c_str());
+        read_msg(__LINE__).issueError("cannot open output file %s: %s\n", out.c_str(),
+                                      std::strerror(errno));
         return VX_FILE_ERROR;
     }
     read_msg(__LINE__).issueStatus("writing %s ...\n", out.c_str());
@@ -268,7 +351,8 @@ VX_STATUS VRX::hxb_write(const char* path) {
         is_design ? hx_env.write_design(db_file, design) : hx_env.write_library(db_file, library);
     if (!written) db_file->fail();  // the database has said why
     if (!Port::File::close(db_file) && written) {
-        read_msg(__LINE__).issueError("error writing output file %s\n", out.c_str());
+        read_msg(__LINE__).issueError("error writing output file %s: %s\n", out.c_str(),
+                                      std::strerror(errno != 0 ? errno : EIO));
         return VX_FILE_ERROR;
     }
     return written ? VX_OK : VX_FILE_ERROR;

@@ -108,15 +108,19 @@ class VRX {
     /// `filter_file` names a property filter that every written property
     /// passes through (null keeps the filter of an earlier call);
     /// `omit_user` leaves out the USER flag of blocks. The text goes to a
-    /// temporary file first; `path` is replaced only by a complete file, and
-    /// every failure leaves it untouched and removes the temporary file.
+    /// temporary file beside `path` first; `path` is replaced only by a
+    /// complete file, and every failure leaves it untouched and removes the
+    /// temporary file. A device, FIFO, socket or terminal, and "-" (standard
+    /// output), are written in place (Port::ReplaceFile). A `path` that is the
+    /// file read is refused. With SOURCE_DATE_EPOCH set, the header's time is
+    /// that moment in UTC.
     VX_STATUS vrx_write(const char* path, const char* filter_file, uint8_t omit_user);
 
     // --- Text to database -----------------------------------------------------
 
     /// Reads the text netlists `names`, in order, into a new library named
     /// after the first name. A name without an extension is read with ".vrx"
-    /// added. With `is_design` set the result is the last design the text
+    /// added; "-" is standard input. With `is_design` set the result is the last design the text
     /// defines, else the whole library; `make_physroot` derives a physical
     /// root for designs whose logical root carries PHYSICAL; `nograft` (for
     /// libraries only) keeps designs from being grafted into each other.
@@ -134,8 +138,10 @@ class VRX {
     void set_all_findings(bool all) { all_findings = all; }
     /// Stores what vrx_read built, the last design (.hxb) or the library
     /// (.hxl), as a database file. A null `path` names the file after the
-    /// first input of vrx_read; the extension is set to fit what is written.
-    /// `path` is replaced only by a complete file; VX_FILE_ERROR otherwise.
+    /// first input of vrx_read; the extension is set to fit what is written
+    /// (not for "-" or an existing device, FIFO or socket, written in place).
+    /// `path` is replaced only by a complete file, and never when it is one
+    /// of the files read; VX_FILE_ERROR otherwise.
     VX_STATUS hxb_write(const char* path);
 
   private:
@@ -163,7 +169,7 @@ class VRX {
         if (progress_fn != nullptr)
             progress_fn(progress_context, progress_what.c_str(), done, total);
     }
-    void report_write_progress(const char* file, bool complete);
+    void report_write_progress(bool complete);
     static void forward_progress(void* self, uint64_t done, uint64_t total);
     static void forward_scan_progress(void* self, uint64_t done);
 
@@ -233,7 +239,8 @@ class VRX {
     // Database to text: the top of the file and the library.
     void write_file_header();
     void write_library();
-    VX_STATUS finish_write(const char* path, const char* temp_name);
+    VX_STATUS finish_write(const char* path, Port::ReplaceFile& out);
+    bool is_an_input(const char* output) const;
 
     // Output layer: every byte of a written netlist passes through here.
     // An absent word of write_indent is a view without data.

@@ -10,6 +10,7 @@
 // both succeeded, 2 after a fatal report (which ends the run), or 64 for a
 // usage error.
 #include <cstdint>
+#include <cstring>
 
 #include "tool_args.h"
 #include "tool_progress.h"
@@ -31,8 +32,10 @@ constexpr vrx_tool::ToolInfo kInfo = {
     "[-f FILE | --filter FILE] [-u | --omit-user] [-q | --quiet] INPUT OUTPUT",
     "\n"
     "Writes the design (.hxb) or library (.hxl) file INPUT as the VRX text netlist OUTPUT.\n"
-    "OUTPUT is replaced only by a complete file. On a terminal, standard error shows how far\n"
-    "each step has come.\n"
+    "OUTPUT is replaced only by a complete file; a device, FIFO or terminal is written in\n"
+    "place. \"-\" as INPUT reads standard input, as OUTPUT writes standard output. An OUTPUT\n"
+    "that is the INPUT file is refused. With SOURCE_DATE_EPOCH set, the header's time is\n"
+    "that, in UTC. On a terminal, standard error shows how far each step has come.\n"
     "\n"
     "Options:\n"
     "  -f, --filter FILE  pass every written property through the property filter FILE\n"
@@ -79,7 +82,8 @@ Settings settings_from(const vrx_tool::CommandLine& line) {
 }
 
 int convert(const Settings& settings) {
-    vrx_tool::ProgressLine* progress = vrx_tool::set_up_output(settings.quiet);
+    vrx_tool::ProgressLine* progress =
+        vrx_tool::set_up_output(settings.quiet, std::strcmp(settings.output, "-") == 0);
     VRX vrx;
     if (progress != nullptr) vrx.set_progress(vrx_tool::ProgressLine::report, progress);
     const VX_STATUS read = vrx.hxb_read(settings.input);
@@ -95,5 +99,6 @@ int convert(const Settings& settings) {
 int main(int argc, char** argv) {
     const vrx_tool::CommandLine line = vrx_tool::parse_command_line(argc, argv, kOptions, kInfo);
     if (line.exit_status) return *line.exit_status;
+    Port::guard_temporary_files();
     return convert(settings_from(line));
 }

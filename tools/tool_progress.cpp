@@ -88,15 +88,20 @@ void ProgressLine::clear() {
 
 // --- messages --------------------------------------------------------------------
 
-ProgressLine* set_up_output(bool quiet) {
+ProgressLine* set_up_output(bool quiet, bool output_on_stdout) {
     static ProgressLine line(stderr, terminal_width(STDERR_FILENO));
     ProgressLine* shown = !quiet && isatty(STDERR_FILENO) ? &line : nullptr;
-    Port_MsgDispatcher::set_sink(
-        [shown, quiet](Port_MsgLevel level, const Port_MsgLocation& where, std::string_view text) {
-            if (quiet && level <= PORT_MSG_INFO) return;
-            if (shown != nullptr) shown->clear();
-            Port_MsgDispatcher::default_sink(level, where, text);
-        });
+    Port_MsgDispatcher::set_sink([shown, quiet, output_on_stdout](Port_MsgLevel level,
+                                                                  const Port_MsgLocation& where,
+                                                                  std::string_view text) {
+        if (quiet && level <= PORT_MSG_INFO) return;
+        if (shown != nullptr) shown->clear();
+        if (level == PORT_MSG_STATUS && output_on_stdout) {
+            std::fwrite(text.data(), 1, text.size(), stderr);
+            return;
+        }
+        Port_MsgDispatcher::default_sink(level, where, text);
+    });
     return shown;
 }
 

@@ -49,10 +49,12 @@ class ProgressLine {
 };
 
 /// Installs the tools' message sink: every message first erases the progress
-/// line, and with `quiet` status and info messages are dropped. Returns the
+/// line, and with `quiet` status and info messages are dropped. When the
+/// converted output goes to standard output, status lines go to standard
+/// error instead, so that they do not mix with it. Returns the
 /// process-wide progress line to hand to VRX::set_progress (with
 /// ProgressLine::report) when standard error is a terminal and `quiet` is
 /// clear, else null.
-ProgressLine* set_up_output(bool quiet);
+ProgressLine* set_up_output(bool quiet, bool output_on_stdout = false);
 
 }  // namespace vrx_tool

@@ -19,6 +19,7 @@
 // the run), or 64 for a usage error.
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 
 #include "tool_args.h"
 #include "tool_progress.h"
@@ -50,6 +51,9 @@ constexpr vrx_tool::ToolInfo kInfo = {
     "design they define as a design file (.hxb), or with -l the whole library as a library\n"
     "file (.hxl). An INPUT without an extension is read with \".vrx\" added. The output is\n"
     "named after the first INPUT unless -o names it; its extension is set to .hxb or .hxl.\n"
+    "\"-\" as INPUT reads standard input (name the output with -o then); \"-o -\" writes\n"
+    "standard output, and a device or FIFO is written in place under its own name. An\n"
+    "output that is one of the inputs is refused.\n"
     "No output is written after a file or parse error; after design-rule errors it is.\n"
     "On a terminal, standard error shows how far each step has come.\n"
     "\n"
@@ -115,7 +119,8 @@ Settings settings_from(const vrx_tool::CommandLine& line) {
 }
 
 int convert(const Settings& settings) {
-    vrx_tool::ProgressLine* progress = vrx_tool::set_up_output(settings.quiet);
+    const bool to_stdout = settings.output != nullptr && std::strcmp(settings.output, "-") == 0;
+    vrx_tool::ProgressLine* progress = vrx_tool::set_up_output(settings.quiet, to_stdout);
     VRX vrx;
     if (progress != nullptr) vrx.set_progress(vrx_tool::ProgressLine::report, progress);
     vrx.set_all_findings(settings.all_findings);
@@ -133,5 +138,6 @@ int convert(const Settings& settings) {
 int main(int argc, char** argv) {
     const vrx_tool::CommandLine line = vrx_tool::parse_command_line(argc, argv, kOptions, kInfo);
     if (line.exit_status) return *line.exit_status;
+    Port::guard_temporary_files();
     return convert(settings_from(line));
 }

@@ -16,8 +16,6 @@
 #include <climits>
 #include <cstdarg>
 #include <cstring>
-#include <filesystem>
-#include <system_error>
 
 #include "hx_property.h"
 #include "ut_nch_cache.h"
@@ -263,17 +261,14 @@ void VRX::begin_construct() {
 void VRX::end_construct() {
     --indent;
     write_indent(2, "}", "\r\n");
-    if ((++constructs_written & (kConstructsPerReport - 1)) == 0)
-        report_write_progress(out_stream->name(), false);
+    if ((++constructs_written & (kConstructsPerReport - 1)) == 0) report_write_progress(false);
 }
 
-// The size of `file` is what left the stream's buffer so far; once the file
-// is complete, it is the total too.
-void VRX::report_write_progress(const char* file, bool complete) {
+// The size is what left the stream's buffer so far; once the file is
+// complete, it is the total too.
+void VRX::report_write_progress(bool complete) {
     if (progress_fn == nullptr) return;
-    std::error_code error;
-    const std::uintmax_t size = std::filesystem::file_size(file, error);
-    if (error) return;
+    const std::uint64_t size = out_stream->bytes_written();
     report_progress(size, complete ? size : 0);
 }
 

@@ -40,7 +40,8 @@ TEST_F(BuilderTest, InputNameWithAndWithoutExtension) {
     capture.clear();
     ASSERT_EQ(vrx.vrx_read(dir.file("missing.vrx").c_str(), 1, 0, 0), VX_FILE_ERROR);
     EXPECT_EQ(own_texts(PORT_MSG_ERROR),
-              std::vector<std::string>{"cannot open input file " + dir.file("missing.vrx") + "\n"});
+              std::vector<std::string>{"cannot open input file " + dir.file("missing.vrx") +
+                                       ": No such file or directory\n"});
     EXPECT_STREQ(vrx.get_library()->get_name(), "missing");
 }
 
@@ -64,7 +65,8 @@ TEST_F(BuilderTest, SeveralFilesContinueOneLibraryAndStopAtTheFirstFailure) {
     capture.clear();
     ASSERT_EQ(vrx.vrx_read(names({"first", "gone"}), 0, 0, 0), VX_FILE_ERROR);
     EXPECT_EQ(own_texts(PORT_MSG_ERROR),
-              std::vector<std::string>{"cannot open input file " + dir.file("gone.vrx") + "\n"});
+              std::vector<std::string>{"cannot open input file " + dir.file("gone.vrx") +
+                                       ": No such file or directory\n"});
     EXPECT_NE(vrx.get_library()->find_design("a"), nullptr);
     EXPECT_EQ(own_texts(PORT_MSG_STATUS),  // no check of an incomplete result
               std::vector<std::string>{"reading VRX file " + first + " ...\n"});

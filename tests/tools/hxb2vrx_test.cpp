@@ -226,8 +226,10 @@ TEST_F(Hxb2vrxTest, FailedStepExits1AndLeavesNoFileBehind) {
     };
     const std::vector<Case> cases = {
         {{dir_.file("missing.hxb"), output}, "cannot open input file '" + dir_.file("missing.hxb")},
-        {{"-", output}, "cannot open input file '-'"},  // a lone dash is an operand
-        {{not_database, output}, not_database},
+        {{dir_.path(), output},
+         "cannot open input file '" + dir_.path() + "': '" + dir_.path() + "' is a directory"},
+        {{not_database, output},
+         not_database + "' is neither a design nor a library file (it holds text"},
         {{"-f", malformed, design, output}, "error reading property filter file '" + malformed},
         {{"--filter", absent, design, output}, "error reading property filter file '" + absent},
     };

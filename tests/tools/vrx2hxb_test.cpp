@@ -208,9 +208,15 @@ TEST_F(Vrx2hxbTest, OutputOptionNamesTheFileInEveryForm) {
         const ToolRun r = run(args);
         EXPECT_EQ(r.status, 0) << r.err;
     }
-    // The extension fits what is written; a name without one gets it.
+    // The extension fits what is written; a name without one gets it, one
+    // with another is told of the change.
+    const ToolRun other = run({"-o", dir_.file("e.txt"), text});
+    EXPECT_NE(other.err.find("output file " + dir_.file("e.txt") + " is written as " +
+                             dir_.file("e.hxb")),
+              std::string::npos)
+        << other.err;
     EXPECT_EQ(dir_.entries(),
-              (std::vector<std::string>{"a.hxb", "b.hxb", "c.hxb", "d.hxb", "top.vrx"}));
+              (std::vector<std::string>{"a.hxb", "b.hxb", "c.hxb", "d.hxb", "e.hxb", "top.vrx"}));
 }
 
 TEST_F(Vrx2hxbTest, LibraryOptionWritesEveryDesignAsALibraryFile) {

@@ -18,7 +18,8 @@ std::string literal(const std::string& text) {
     return std::regex_replace(text, special, R"(\$&)");
 }
 std::string not_a_database_file(const std::string& path) {
-    return literal("input file '" + path + "' is neither a design nor a library file\n");
+    return literal("input file '" + path + "' is neither a design nor a library file") +
+           "( \\(it holds text: [^)]*\\))?\n";
 }
 std::string nothing_loaded(const std::string& path) {
     return literal("no design or library has been read to write to '" + path + "'\n");
@@ -262,8 +263,10 @@ TEST_F(PipelineTest, InputFilesThatCannotBeLoadedLeaveWhatWasLoaded) {
     select_design();
     const std::string missing = dir.file("missing.hxb");
     EXPECT_EQ(vrx.hxb_read(missing.c_str()), VX_FILE_ERROR);
-    EXPECT_EQ(errors(), std::vector<std::string>{"cannot open input file '" + missing + "'\n"});
-    expect_pipeline_report(PORT_MSG_ERROR, "cannot open input file '" + missing + "'\n");
+    const std::string not_found =
+        "cannot open input file '" + missing + "': No such file or directory\n";
+    EXPECT_EQ(errors(), std::vector<std::string>{not_found});
+    expect_pipeline_report(PORT_MSG_ERROR, not_found);
 
     const std::string garbage = dir.file("garbage.hxb");
     ScratchDir::write_file(garbage, "this is no database file\n");
@@ -309,11 +312,8 @@ TEST_F(PipelineTest, DestinationInAMissingDirectory) {
     select_design();
     const std::string path = dir.file("no/such/dir/out.vrx");
     EXPECT_EQ(vrx.vrx_write(path.c_str(), nullptr, 0), VX_FILE_ERROR);
-    ASSERT_EQ(errors().size(), 1u);
-    const std::regex copy_failed("Unable to copy temporary file '" + tmp.path() + "/[^']+' to '" +
-                                 path + "'\\.\n");
-    EXPECT_TRUE(std::regex_match(errors()[0], copy_failed)) << errors()[0];
-    expect_pipeline_report(PORT_MSG_ERROR, errors()[0]);
+    expect_pipeline_report(PORT_MSG_ERROR, "cannot open temporary output file '" + path +
+                                               "': No such file or directory\n");
     expect_untouched(path, nullptr);
 }
 

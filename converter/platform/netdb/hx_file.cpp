@@ -1740,8 +1740,10 @@ namespace {
 
 bool report_write(UT_PTRFILE* file, bool written) {
     if (!written) {
+        const int error = file != nullptr ? file->error() : 0;
         PORT_MSG("HX", kRevision)
-            .issueError("cannot write database file '%s'\n", file ? file->name() : "");
+            .issueError("cannot write database file '%s'%s%s\n", file ? file->name() : "",
+                        error != 0 ? ": " : "", error != 0 ? std::strerror(error) : "");
     }
     return written;
 }

@@ -1,13 +1,17 @@
 #include "port_file.h"
 
 #include <fcntl.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/un.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <climits>
+#include <csignal>
 #include <cstdlib>
 #include <cstring>
+#include <ctime>
 
 #include "port_msg.h"
 #include "ut_ptrfile.h"
@@ -28,21 +32,48 @@ mode_t new_file_mode() {
     return mode;
 }
 
-// An existing destination keeps its permissions; a new one gets the default.
-mode_t destination_mode(const std::string& target) {
+// A replaced file keeps its owner and mode where the process may set them;
+// set-id bits are not carried to a file that another owner would not have.
+bool keep_owner_and_mode(int fd, const std::string& target) {
     struct stat st;
-    if (::stat(target.c_str(), &st) == 0 && S_ISREG(st.st_mode)) return st.st_mode & 07777;
-    return new_file_mode();
+    if (::stat(target.c_str(), &st) != 0 || !S_ISREG(st.st_mode))
+        return ::fchmod(fd, new_file_mode()) == 0;
+    mode_t mode = st.st_mode & 07777;
+    if ((st.st_uid != ::geteuid() || st.st_gid != ::getegid()) &&
+        ::fchown(fd, st.st_uid, st.st_gid) != 0) {
+        if (::fchown(fd, static_cast<uid_t>(-1), st.st_gid) != 0) mode &= ~S_ISGID;
+        mode &= ~S_ISUID;
+    }
+    return ::fchmod(fd, mode) == 0;
 }
 
-std::string resolve_destination(const char* destination) {
-    char resolved[PATH_MAX];
-    struct stat st;
-    if (::lstat(destination, &st) == 0 && S_ISLNK(st.st_mode) &&
-        ::realpath(destination, resolved) != nullptr) {
-        return resolved;
+// Links under /proc and /dev/fd name open descriptors (a pipe, a terminal, a
+// file opened by the shell), not paths that can be replaced.
+bool names_descriptor(const std::string& path) {
+    return path.starts_with("/proc/") || path.starts_with("/dev/fd/");
+}
+
+// Follows symbolic links by hand, so that a dangling one yields the path it
+// names. `descriptor` tells that the chain passed through a descriptor link.
+bool follow_links(const char* destination, std::string& target, bool& descriptor) {
+    target = destination;
+    descriptor = names_descriptor(target);
+    for (int hops = 0; hops < 40; ++hops) {
+        struct stat st;
+        if (::lstat(target.c_str(), &st) != 0 || !S_ISLNK(st.st_mode)) return true;
+        std::string link(PATH_MAX, '\0');
+        const ssize_t n = ::readlink(target.c_str(), link.data(), link.size());
+        if (n < 0) return false;
+        link.resize(static_cast<std::size_t>(n));
+        if (!link.starts_with('/')) {
+            const auto slash = target.find_last_of('/');
+            if (slash != std::string::npos) link = target.substr(0, slash + 1) + link;
+        }
+        target = link;
+        descriptor = descriptor || names_descriptor(target);
     }
-    return destination;
+    errno = ELOOP;
+    return false;
 }
 
 void split_path(const std::string& path, std::string& dir, std::string& base) {
@@ -56,6 +87,25 @@ void split_path(const std::string& path, std::string& dir, std::string& base) {
     }
 }
 
+// A hidden name beside the destination; a short one when the destination's
+// own name leaves no room for the suffix.
+std::string temp_template(const std::string& dir, const std::string& base) {
+    constexpr std::size_t kNameMax = 255;
+    const std::string stem = base.size() + 8 <= kNameMax ? base : std::string("vrx");
+    return dir + "/." + stem + ".XXXXXX";
+}
+
+// Replaces the trailing XXXXXX with letters that differ between calls and processes.
+void fill_template(std::string& name) {
+    static unsigned long counter = 0;
+    timespec now{};
+    ::clock_gettime(CLOCK_REALTIME, &now);
+    unsigned long long v = static_cast<unsigned long long>(now.tv_nsec) ^
+                           (static_cast<unsigned long long>(::getpid()) << 20) ^ (++counter * 7919);
+    for (std::size_t i = name.size() - 6; i < name.size(); ++i, v /= 36)
+        name[i] = "abcdefghijklmnopqrstuvwxyz0123456789"[v % 36];
+}
+
 const char* temp_directory() {
     const char* dir = std::getenv("TMPDIR");
     struct stat st;
@@ -65,6 +115,62 @@ const char* temp_directory() {
 
 int create_exclusive(std::string& name_template) {
     return ::mkstemp(name_template.data());
+}
+
+// Names of temporary files that exist now, removed on a signal or at exit.
+// Fixed storage that the signal handler only reads.
+struct TempSlot {
+    volatile std::sig_atomic_t used;
+    char path[PATH_MAX];
+};
+constexpr int kTempSlots = 16;
+TempSlot temp_slots[kTempSlots];
+
+void remove_temporaries() {
+    for (TempSlot& slot : temp_slots) {
+        if (slot.used) ::unlink(slot.path);
+    }
+}
+
+int register_temp(const std::string& path) {
+    static const bool hooked = std::atexit(remove_temporaries) == 0;
+    (void)hooked;
+    if (path.size() >= PATH_MAX) return -1;
+    for (int i = 0; i < kTempSlots; ++i) {
+        if (temp_slots[i].used) continue;
+        std::memcpy(temp_slots[i].path, path.c_str(), path.size() + 1);
+        temp_slots[i].used = 1;
+        return i;
+    }
+    return -1;
+}
+
+void unregister_temp(int slot) {
+    if (slot >= 0) temp_slots[slot].used = 0;
+}
+
+extern "C" void remove_temporaries_and_die(int signal_number) {
+    remove_temporaries();
+    ::signal(signal_number, SIG_DFL);
+    ::raise(signal_number);  // delivered when the handler returns
+}
+
+// A Unix-domain socket is written by connecting to it.
+int connect_socket(const char* path) {
+    sockaddr_un address{};
+    if (std::strlen(path) >= sizeof address.sun_path) {
+        errno = ENAMETOOLONG;
+        return -1;
+    }
+    address.sun_family = AF_UNIX;
+    std::strcpy(address.sun_path, path);
+    const int fd = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    if (fd < 0) return -1;
+    if (::connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0) return fd;
+    const int saved = errno;
+    ::close(fd);
+    errno = saved;
+    return -1;
 }
 
 }  // namespace
@@ -103,6 +209,7 @@ void Stream::attach(int fd, const char* name, bool owns) {
     error_ = 0;
     name_ = name ? name : "";
     begin_ = end_ = 0;
+    bytes_written_ = 0;
     update_write_limit();
 }
 
@@ -142,6 +249,7 @@ bool Stream::write_through(const void* bytes, std::size_t count) {
         if (!flush()) return false;
         if (count >= buffer_.size()) {  // large pieces bypass the buffer
             if (!write_all(fd_, bytes, count)) error_ = errno;
+            if (error_ == 0) bytes_written_ += count;
             update_write_limit();
             return error_ == 0;
         }
@@ -160,6 +268,7 @@ bool Stream::flush() {
     if (error_ != 0) return false;
     if (end_ > 0 && fd_ >= 0) {
         if (!write_all(fd_, buffer_.data(), end_)) error_ = errno;
+        if (error_ == 0) bytes_written_ += end_;
         end_ = 0;
     }
     update_write_limit();
@@ -216,38 +325,156 @@ bool ReplaceFile::create(const char* destination) {
         errno = EINVAL;
         return false;
     }
-    target_ = resolve_destination(destination);
+    if (std::strcmp(destination, "-") == 0) {
+        shown_ = destination;
+        fd_ = ::fcntl(STDOUT_FILENO, F_DUPFD_CLOEXEC, 3);
+        in_place_ = fd_ >= 0;
+        return in_place_;
+    }
+    bool descriptor = false;
+    if (!follow_links(destination, target_, descriptor)) return false;
+    struct stat st;
+    const char* probe = descriptor ? destination : target_.c_str();
+    if (::stat(probe, &st) == 0) {
+        if (S_ISDIR(st.st_mode)) {
+            errno = EISDIR;
+            return false;
+        }
+        if (descriptor || !S_ISREG(st.st_mode))
+            return open_in_place(destination, S_ISREG(st.st_mode) ? O_TRUNC : 0);
+    } else if (errno != ENOENT || descriptor) {
+        return false;
+    }
     std::string dir, base;
     split_path(target_, dir, base);
-    temp_ = dir + "/." + base + ".XXXXXX";
+    return open_unnamed(dir) || open_named(dir, base);
+}
+
+// Devices, FIFOs, sockets and terminals are written through, never replaced.
+bool ReplaceFile::open_in_place(const char* path, int flags) {
+    struct stat st;
+    if (::stat(path, &st) == 0 && S_ISSOCK(st.st_mode)) {
+        fd_ = connect_socket(path);
+    } else {
+        do {
+            fd_ = ::open(path, O_WRONLY | O_NOCTTY | O_CLOEXEC | flags);
+        } while (fd_ < 0 && errno == EINTR);
+    }
+    if (fd_ < 0) return false;
+    in_place_ = true;
+    shown_ = path;
+    return true;
+}
+
+// Linking an unnamed file into place needs its /proc entry.
+bool ReplaceFile::open_unnamed(const std::string& dir) {
+    if (::access("/proc/self/fd", X_OK) != 0) return false;
+    fd_ = ::open(dir.c_str(), O_TMPFILE | O_WRONLY | O_CLOEXEC, 0600);
+    if (fd_ < 0) return false;
+    unnamed_ = true;
+    shown_ = target_;
+    return true;
+}
+
+bool ReplaceFile::open_named(const std::string& dir, const std::string& base) {
+    temp_ = temp_template(dir, base);
     fd_ = create_exclusive(temp_);
     if (fd_ < 0) {
         temp_.clear();
         return false;
     }
+    slot_ = register_temp(temp_);
+    shown_ = temp_;
     return true;
+}
+
+// An absent destination is linked directly; an existing one is replaced by
+// linking under a temporary name and renaming that over it.
+bool ReplaceFile::link_unnamed() {
+    const std::string self = "/proc/self/fd/" + std::to_string(fd_);
+    if (::linkat(AT_FDCWD, self.c_str(), AT_FDCWD, target_.c_str(), AT_SYMLINK_FOLLOW) == 0)
+        return true;
+    if (errno != EEXIST) return false;
+    std::string dir, base;
+    split_path(target_, dir, base);
+    for (int attempt = 0; attempt < 100; ++attempt) {
+        temp_ = temp_template(dir, base);
+        fill_template(temp_);
+        slot_ = register_temp(temp_);
+        if (::linkat(AT_FDCWD, self.c_str(), AT_FDCWD, temp_.c_str(), AT_SYMLINK_FOLLOW) == 0)
+            return ::rename(temp_.c_str(), target_.c_str()) == 0;
+        const int saved = errno;
+        forget_temp();
+        errno = saved;
+        if (errno != EEXIST) return false;
+    }
+    return false;
 }
 
 bool ReplaceFile::commit() {
     if (fd_ < 0) return false;
-    bool ok = ::fchmod(fd_, destination_mode(target_)) == 0 && ::fsync(fd_) == 0;
-    ok = (::close(fd_) == 0) && ok;
-    fd_ = -1;
-    if (ok && ::rename(temp_.c_str(), target_.c_str()) == 0) {
-        temp_.clear();
-        return true;
+    if (in_place_) {
+        const bool closed = ::close(fd_) == 0;
+        fd_ = -1;
+        const int saved = errno;
+        discard();
+        errno = saved;
+        return closed;
     }
+    bool ok = keep_owner_and_mode(fd_, target_) && ::fsync(fd_) == 0;
+    if (unnamed_) {
+        ok = ok && link_unnamed();
+        ok = (::close(fd_) == 0) && ok;
+    } else {
+        ok = (::close(fd_) == 0) && ok;
+        ok = ok && ::rename(temp_.c_str(), target_.c_str()) == 0;
+    }
+    fd_ = -1;
+    if (ok) forget_temp();  // the name now belongs to the destination
     const int saved = errno;
     discard();
     errno = saved;
-    return false;
+    return ok;
+}
+
+void ReplaceFile::forget_temp() {
+    unregister_temp(slot_);
+    slot_ = -1;
+    temp_.clear();
 }
 
 void ReplaceFile::discard() {
     if (fd_ >= 0) ::close(fd_);
     fd_ = -1;
     if (!temp_.empty()) ::unlink(temp_.c_str());
-    temp_.clear();
+    forget_temp();
+    in_place_ = false;
+    unnamed_ = false;
+    target_.clear();
+    shown_.clear();
+}
+
+std::optional<FileId> regular_file_id(const char* path, bool input) {
+    if (path == nullptr) return std::nullopt;
+    struct stat st;
+    const int got = std::strcmp(path, "-") == 0 ? ::fstat(input ? STDIN_FILENO : STDOUT_FILENO, &st)
+                                                : ::stat(path, &st);
+    if (got != 0 || !S_ISREG(st.st_mode)) return std::nullopt;
+    return FileId{st.st_dev, st.st_ino};
+}
+
+void guard_temporary_files() {
+    struct sigaction action {};
+    action.sa_handler = remove_temporaries_and_die;
+    sigemptyset(&action.sa_mask);
+    for (const int signal_number : {SIGINT, SIGTERM, SIGHUP}) {
+        struct sigaction former {};
+        // A signal ignored by whoever started the process (nohup) stays ignored.
+        if (::sigaction(signal_number, nullptr, &former) == 0 && former.sa_handler == SIG_IGN)
+            continue;
+        ::sigaction(signal_number, &action, nullptr);
+    }
+    ::signal(SIGXFSZ, SIG_IGN);
 }
 
 // ---------------------------------------------------------------- File

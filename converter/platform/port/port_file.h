@@ -5,14 +5,16 @@
 // that the caller can refuse to publish a damaged file.
 //
 // Port::File gathers the file operations. copy() replaces its destination
-// atomically (temporary file in the destination's directory, renamed over it),
-// tmpnam() creates a fresh file exclusively so no other process can take the
-// name. Both keep an existing destination's permissions; a new file gets the
-// usual 0666 less the umask.
+// through ReplaceFile, tmpnam() creates a fresh file exclusively so no other
+// process can take the name. A new file gets the usual 0666 less the umask.
 #pragma once
 
+#include <sys/types.h>
+
 #include <cstddef>
+#include <cstdint>
 #include <cstring>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -58,6 +60,8 @@ class Stream {
     int error() const { return error_; }
     int access() const { return access_; }
     const char* name() const { return name_.c_str(); }
+    /// Bytes handed to the system so far (buffered ones not counted).
+    std::uint64_t bytes_written() const { return bytes_written_; }
 
   private:
     friend class File;
@@ -101,6 +105,7 @@ class Stream {
     std::size_t begin_ = 0;  // read: first unread byte
     std::size_t end_ = 0;    // read: end of valid bytes; write: bytes pending
     std::size_t write_limit_ = 0;
+    std::uint64_t bytes_written_ = 0;
 };
 
 class File {
@@ -125,9 +130,16 @@ class File {
     static const char* tmpnam(char* buffer = nullptr, std::size_t size = 0);
 };
 
-/// A temporary file beside a destination, renamed over it by commit() and
-/// removed by discard() or the destructor. A destination that is a symbolic
-/// link is resolved, so the link stays and its target is replaced.
+/// The one way this library writes a destination so that it is whole or
+/// untouched. A path that is absent or names a regular file gets a temporary
+/// file beside it (unnamed where the file system allows, so that not even
+/// SIGKILL leaves it behind), which commit() puts in place; discard() or the
+/// destructor drops it. A symbolic link is followed: its target is replaced
+/// (or, dangling, created) and the link stays. A device, FIFO, socket or
+/// terminal, a descriptor reached through /proc or /dev/fd, and "-" (standard
+/// output) are written in place, never replaced. A replaced file keeps the
+/// owner and mode it had where the process may set them; other hard links to
+/// it keep the former contents, as with any rename.
 class ReplaceFile {
   public:
     ReplaceFile() = default;
@@ -135,19 +147,54 @@ class ReplaceFile {
     ReplaceFile(const ReplaceFile&) = delete;
     ReplaceFile& operator=(const ReplaceFile&) = delete;
 
+    /// False with errno set when nothing could be opened.
     bool create(const char* destination);
     int fd() const { return fd_; }
-    const std::string& temp_name() const { return temp_; }
-    /// Syncs, gives the file the destination's permissions and renames it into
-    /// place. On failure the temporary file is removed and false returned.
+    /// The name to show for the file being written: the temporary file's, or
+    /// the destination's when the temporary file has none or the destination
+    /// is written in place.
+    const std::string& temp_name() const { return shown_; }
+    bool in_place() const { return in_place_; }
+    /// Syncs, gives the file the destination's owner and mode and puts it in
+    /// place. On failure the temporary file is removed and false returned
+    /// with errno set.
     bool commit();
     void discard();
 
   private:
+    bool open_in_place(const char* path, int flags);
+    bool open_unnamed(const std::string& dir);
+    bool open_named(const std::string& dir, const std::string& base);
+    bool link_unnamed();
+    void forget_temp();
+
     int fd_ = -1;
+    bool in_place_ = false;
+    bool unnamed_ = false;
+    int slot_ = -1;  // where the signal and exit cleanup knows the temporary name
     std::string temp_;
     std::string target_;
+    std::string shown_;
 };
+
+/// Device and inode of a file.
+struct FileId {
+    dev_t device = 0;
+    ino_t inode = 0;
+    bool operator==(const FileId&) const = default;
+};
+
+/// The identity of the regular file that path names (links followed; "-" is
+/// standard input when `input` is set, else standard output). Nothing for
+/// other kinds of file and for absent ones.
+std::optional<FileId> regular_file_id(const char* path, bool input);
+
+/// For programs: SIGINT, SIGTERM and SIGHUP remove the temporary files of
+/// writes in progress and then end the process by the same signal (status
+/// 128 + signal to a shell); SIGXFSZ is ignored, so that a size limit makes a
+/// write fail with EFBIG instead of killing the process. A normal exit,
+/// including one through a fatal report, removes them in any case.
+void guard_temporary_files();
 
 /// write(2) until every byte is out; false on an error (errno set).
 bool write_all(int fd, const void* bytes, std::size_t count);

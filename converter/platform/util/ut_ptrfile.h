@@ -1,6 +1,7 @@
 // A database file object: the netlist database reads from it or writes to it.
 //
-// Read access (1) reads the named file. Write access (2) never touches the
+// Read access (1) reads the named file, or standard input for "-"; a pipe
+// or terminal is read in full when opened. Write access (2) never touches the
 // destination while writing: bytes go to a temporary file beside it, which a
 // clean close renames into place. A close after a failed write, after fail(),
 // or destroying the object while still open removes the temporary file and
@@ -11,6 +12,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <string>
+#include <vector>
 
 #include "port_file.h"
 
@@ -35,12 +37,16 @@ class UT_PTRFILE {
     /// Marks the write as failed, so that close will not publish the file.
     void fail() { failed_ = true; }
     bool failed() const { return failed_ || stream_.failed(); }
+    /// The errno of the first failed write or read, 0 when none.
+    int error() const { return stream_.error(); }
 
   private:
     friend class Port::File;
     bool open(const char* name);
     bool close();
     void abandon();
+    bool open_for_reading(const char* name);
+    bool spool(int fd);
 
     int access_;
     bool open_ = false;
@@ -49,4 +55,7 @@ class UT_PTRFILE {
     std::string name_;
     Port::Stream stream_;
     Port::ReplaceFile replace_;
+    std::vector<char> spool_;  // what a pipe or terminal gave, read in full
+    bool spool_used_ = false;
+    std::size_t spool_read_ = 0;
 };

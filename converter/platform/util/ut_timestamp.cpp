@@ -11,9 +11,10 @@ constexpr const char* kMonths[12] = {"Jan", "Feb", "Mar", "Apr", "May", "Jun",
 
 UT_TIMESTAMP::UT_TIMESTAMP() : UT_TIMESTAMP(std::time(nullptr)) {}
 
-UT_TIMESTAMP::UT_TIMESTAMP(std::time_t when) {
+UT_TIMESTAMP::UT_TIMESTAMP(std::time_t when, Zone zone) {
     std::tm t{};
-    if (localtime_r(&when, &t) == nullptr) t = std::tm{};
+    const std::tm* got = zone == UTC ? gmtime_r(&when, &t) : localtime_r(&when, &t);
+    if (got == nullptr) t = std::tm{};
     const int month = t.tm_mon >= 0 && t.tm_mon < 12 ? t.tm_mon : 0;
     UT_STR::SPrintf(year_, sizeof year_, "%04d", t.tm_year + 1900);
     UT_STR::Copy(month_, kMonths[month]);

@@ -1,4 +1,4 @@
-// A moment of local time as texts: hour, minute and second with two digits,
+// A moment of local time (or UTC) as texts: hour, minute and second with two digits,
 // the month as its English three-letter name ("Dec"), the day of the month
 // without a leading zero and the year with four digits.
 #pragma once
@@ -7,8 +7,9 @@
 
 class UT_TIMESTAMP {
   public:
+    enum Zone { LOCAL, UTC };
     UT_TIMESTAMP();  ///< now
-    explicit UT_TIMESTAMP(std::time_t when);
+    explicit UT_TIMESTAMP(std::time_t when, Zone zone = LOCAL);
 
     const char* get_ts_year() const { return year_; }
     const char* get_ts_monthst() const { return month_; }

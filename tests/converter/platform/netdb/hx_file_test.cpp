@@ -576,8 +576,9 @@ TEST(HxFile, AFailedWriteReportsAndLeavesNoFile) {
         EXPECT_FALSE(Port::File::close(&file));
     }
     EXPECT_TRUE(dir.entries().empty());
-    EXPECT_EQ(capture.texts(PORT_MSG_ERROR),
-              std::vector<std::string>{"cannot write database file '" + path + "'\n"});
+    EXPECT_EQ(
+        capture.texts(PORT_MSG_ERROR),
+        std::vector<std::string>{"cannot write database file '" + path + "': File too large\n"});
 
     UT_PTRFILE nothing(Port::ACCESS_WRITE);
     ASSERT_NE(Port::File::open(path.c_str(), &nothing, true), nullptr);
