@@ -15,7 +15,7 @@
 class HX_BLOCK;
 class HX_NETWORK;
 
-/// Bump allocator over chunks that grow from 4 KiB to 4 MiB. Nothing is
+/// Bump allocator over chunks that grow from 64 bytes to 4 MiB. Nothing is
 /// freed before the arena itself; the owner runs destructors. Page faults
 /// are dear: chunks of 64 KiB and more are mapped and their pages faulted in
 /// a window at a time, and once the arena holds 2 MiB its chunks go on huge
@@ -40,11 +40,15 @@ class HX_ARENA {
     void make_room(std::size_t size, std::size_t align);
     void grow(std::size_t at_least);
 
+    // Small first: a library may hold hundreds of thousands of designs of a
+    // block or two, and each design has two arenas.
+    static constexpr std::size_t kFirstChunk = 64;
+
     std::vector<Chunk> chunks_;
     std::byte* cur_ = nullptr;
     std::size_t left_ = 0;  // up to the end of what is faulted in
     std::byte* chunk_end_ = nullptr;
-    std::size_t next_chunk_ = 4096;
+    std::size_t next_chunk_ = kFirstChunk;
     std::size_t reserved_ = 0;
 };
 
