@@ -57,11 +57,28 @@ void discard_output(Port::Stream*& stream, const char* temp_name) {
     remove_temp(temp_name);
 }
 
+// Discards the output that a write left unfinished: one left by an exception
+// (of the host's progress hook, or out of memory) on its way out.
+class UnfinishedOutput {
+  public:
+    UnfinishedOutput(Port::Stream*& stream, const char* temp_name)
+        : stream_(stream), temp_name_(temp_name) {}
+    UnfinishedOutput(const UnfinishedOutput&) = delete;
+    UnfinishedOutput& operator=(const UnfinishedOutput&) = delete;
+    ~UnfinishedOutput() {
+        if (stream_ != nullptr) discard_output(stream_, temp_name_);
+    }
+
+  private:
+    Port::Stream*& stream_;
+    const char* temp_name_;
+};
+
 }  // namespace
 
 // --- hxb_read ----------------------------------------------------------------------
 
-VX_STATUS VRX::hxb_read(const char* path) {
+VX_STATUS VRX::load_database(const char* path) {
     if (path == nullptr || *path == '\0') {
         write_msg(__LINE__).issueError("cannot open input file '%s'\n", "");
         return VX_FILE_ERROR;
@@ -108,7 +125,7 @@ VX_STATUS VRX::hxb_read(const char* path) {
 
 // --- vrx_write ---------------------------------------------------------------------
 
-VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit_user_flag) {
+VX_STATUS VRX::write_text(const char* path, const char* filter_file, uint8_t omit_user_flag) {
     omit_user = omit_user_flag;
     if ((is_design ? static_cast<void*>(design) : static_cast<void*>(library)) == nullptr) {
         write_msg(__LINE__).issueError("no design or library has been read to write to '%s'\n",
@@ -131,6 +148,7 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
     }
     const std::unique_ptr<char[]> temp_name(UT_STR::Dup(temp));
     track_temp(temp_name.get());
+    const UnfinishedOutput unfinished(out_stream, temp_name.get());
     if (Port::File::open(temp_name.get(), out_stream, true) == nullptr) {
         write_msg(__LINE__).issueError("cannot open temporary output file '%s'\n", temp_name.get());
         discard_output(out_stream, temp_name.get());

@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "msg_capture.h"
+#include "scratch_dir.h"
 #include "vrx.h"
 
 // Reaches the converter's private state for the tests.
@@ -88,6 +89,29 @@ TEST(ConverterTest, CopiesOwnTheirFirstInputAndLeaveTheActiveConverterAlone) {
     // the active converter (the sanitizer build catches a double free).
     EXPECT_EQ(active_vrx, &vrx);
     EXPECT_STREQ(A::first_input(vrx), "design.vrx");
+}
+
+// A copy reads for itself, whether or not its source is still there, and
+// reports its own parse's outcome.
+TEST(ConverterTest, CopiesReadTheirOwnTextAndStatus) {
+    MsgCapture capture;
+    ScratchDir dir;
+    const std::string good = dir.file("good.vrx");
+    const std::string bad = dir.file("bad.vrx");
+    ScratchDir::write_file(good, "DESIGN top { BLOCK top 1 { PIN a (TYPE=IN) } }\n");
+    ScratchDir::write_file(bad, "DESIGN top { BLOCK top 1 { PIN a (TYPE=IN) }\n");
+    auto source = std::make_unique<VRX>();
+    VRX copy(*source);
+    EXPECT_EQ(copy.vrx_read(bad.c_str(), 1, 0, 0), VX_PARSE_ERROR);
+    EXPECT_EQ(copy.vrx_read(good.c_str(), 1, 0, 0), VX_OK);
+    ASSERT_NE(copy.get_design(), nullptr);
+    EXPECT_STREQ(copy.get_design()->get_name(), "top");
+    EXPECT_EQ(source->get_design(), nullptr);
+    EXPECT_EQ(active_vrx, source.get());
+    source.reset();
+    EXPECT_EQ(copy.vrx_read(bad.c_str(), 1, 0, 0), VX_PARSE_ERROR);
+    EXPECT_EQ(active_vrx, nullptr);
+    hx_env.delete_library(copy.get_library());
 }
 
 TEST(SignalCacheTest, FindOrCreateMakesEachNameOnceInTheRightRoot) {

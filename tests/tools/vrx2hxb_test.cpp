@@ -316,4 +316,36 @@ TEST_F(Vrx2hxbTest, ErrorLimitEndsTheRunWithStatus2) {
     EXPECT_TRUE(tmp_.entries().empty());
 }
 
+// Each design grafts the one before twice: 2^40 gates from a few kilobytes.
+// Under a memory limit the run ends as a fatal error, and writes nothing.
+TEST_F(Vrx2hxbTest, RunningOutOfMemoryIsFatalAndLeavesNoFile) {
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_UNDEFINED__)
+    GTEST_SKIP() << "the sanitizers' shadow memory does not fit a memory limit";
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(undefined_behavior_sanitizer)
+    GTEST_SKIP() << "the sanitizers' shadow memory does not fit a memory limit";
+#endif
+#endif
+    std::string text = kTop;
+    for (int i = 1; i <= 40; ++i) {
+        const std::string inner = i == 1 ? "top" : "d" + std::to_string(i - 1);
+        text += "DESIGN d" + std::to_string(i) + " {\n BLOCK d" + std::to_string(i) +
+                " 2 { PIN a (TYPE=IN CONN=a) PIN y (TYPE=OUT CONN=y) }\n";
+        for (const char* use : {" (NAME=u1) { PIN a (CONN=a) PIN y (CONN=m) }\n",
+                                " (NAME=u2) { PIN a (CONN=m) PIN y (CONN=y) }\n"})
+            text += " BLOCK " + inner + " 2" + use;
+        text += "}\n";
+    }
+    const std::string path = input("doubling.vrx", text.c_str());
+    const ToolRun r = vrx_test::run_tool(
+        "/bin/sh", {"-c", "ulimit -v 300000 && exec \"$0\" \"$@\"", VRX2HXB_PATH, path},
+        {dir_.path(), tmp_.path(), capture_.path(), ""});
+    EXPECT_EQ(r.status, 2);
+    EXPECT_NE(r.err.find("FATAL_ERROR:Quorra - out of memory while building design 'd"),
+              std::string::npos)
+        << r.err;
+    EXPECT_EQ(dir_.entries(), (std::vector<std::string>{"doubling.vrx"}));
+    EXPECT_TRUE(tmp_.entries().empty());
+}
+
 }  // namespace
