@@ -12,6 +12,8 @@
 #include <utility>
 #include <vector>
 
+#include "ut_lazy_map.h"
+
 class HX_BLOCK;
 class HX_NETWORK;
 
@@ -33,7 +35,7 @@ class HX_ARENA {
 
   private:
     struct Chunk {
-        std::byte* start;
+        Chunk* prev;
         std::size_t size;
         bool mapped;  // else from malloc
     };
@@ -44,7 +46,7 @@ class HX_ARENA {
     // block or two, and each design has two arenas.
     static constexpr std::size_t kFirstChunk = 64;
 
-    std::vector<Chunk> chunks_;
+    Chunk* last_ = nullptr;  // the chunks, newest first, each at its own start
     std::byte* cur_ = nullptr;
     std::size_t left_ = 0;  // up to the end of what is faulted in
     std::byte* chunk_end_ = nullptr;
@@ -211,11 +213,11 @@ struct HX_DESIGN_STORAGE {
     std::shared_ptr<HX_ARENA> text = std::make_shared<HX_ARENA>();
     std::vector<std::shared_ptr<HX_ARENA>> shared_text;
     HX_TAG_TABLE<> tags;
-    std::unordered_map<const HX_BLOCK*, HX_PIN_NAME_INDEX> pin_names;
+    UT_LAZY_MAP<const HX_BLOCK*, HX_PIN_NAME_INDEX> pin_names;
     void* spare_networks = nullptr;  // dropped networks' memory, chained through it
     // Each join's dropped tag and the tag that took it over, in join order,
     // and an index of the first `joined_indexed` of them, made when asked.
     std::vector<std::pair<uint32_t, uint32_t>> joined_tags;
-    std::unordered_map<uint32_t, uint32_t> joined_index;
+    UT_LAZY_MAP<uint32_t, uint32_t> joined_index;
     std::size_t joined_indexed = 0;
 };
