@@ -1682,17 +1682,15 @@ std::unique_ptr<HX_LIBRARY> HX_FILE_IO::read(UT_PTRFILE* file, HX_FILE_TYPE expe
     if (!readable(file)) {
         reason = "not open for reading";
     } else {
+        // Running out of memory is not the file's fault: std::bad_alloc goes
+        // on to the caller, as everywhere in the database.
         BigBytes buffer;
         const uint8_t* data = nullptr;
         std::size_t size = 0;
-        try {
-            if (read_all(file, buffer, data, size)) {
-                library = decode(data, size, expected, reason);
-            } else {
-                reason = "could not be read completely";
-            }
-        } catch (const std::bad_alloc&) {
-            reason = "too large to load";
+        if (read_all(file, buffer, data, size)) {
+            library = decode(data, size, expected, reason);
+        } else {
+            reason = "could not be read completely";
         }
     }
     if (library == nullptr && !quiet) {
