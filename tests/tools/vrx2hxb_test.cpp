@@ -319,13 +319,7 @@ TEST_F(Vrx2hxbTest, ErrorLimitEndsTheRunWithStatus2) {
 // Each design grafts the one before twice: 2^40 gates from a few kilobytes.
 // Under a memory limit the run ends as a fatal error, and writes nothing.
 TEST_F(Vrx2hxbTest, RunningOutOfMemoryIsFatalAndLeavesNoFile) {
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_UNDEFINED__)
-    GTEST_SKIP() << "the sanitizers' shadow memory does not fit a memory limit";
-#elif defined(__has_feature)
-#if __has_feature(address_sanitizer) || __has_feature(undefined_behavior_sanitizer)
-    GTEST_SKIP() << "the sanitizers' shadow memory does not fit a memory limit";
-#endif
-#endif
+    if (VRX_SANITIZED) GTEST_SKIP() << "the sanitizers' shadow memory does not fit the limit";
     std::string text = kTop;
     for (int i = 1; i <= 40; ++i) {
         const std::string inner = i == 1 ? "top" : "d" + std::to_string(i - 1);
