@@ -1,6 +1,7 @@
 // The converter object: construction, copies, the active converter, the
 // progress hook and the signal caches.
 #include <algorithm>
+#include <cstdio>
 #include <cstring>
 #include <exception>
 #include <new>
@@ -10,7 +11,6 @@
 #include "ut_str.h"
 #include "vrx.h"
 #include "vx_builder_internal.h"
-#include "vx_progress_hooks.h"
 #include "vx_text.h"
 
 VRX* active_vrx = nullptr;
@@ -46,6 +46,20 @@ class ReaderTarget {
 
 // --- the conversions ---------------------------------------------------------------
 
+template <class Body>
+VX_STATUS VRX::guarded(const char* doing, const char* path, VX_STATUS failed, Body&& body) {
+    try {
+        return body();
+    } catch (const std::bad_alloc&) {
+        abandon_files();
+        report_out_of_memory(doing, path);
+        return failed;
+    } catch (const HostException& host) {
+        abandon_files();
+        std::rethrow_exception(host.error);
+    }
+}
+
 VX_STATUS VRX::hxb_read(const char* path) {
     return guarded("loading", path, VX_FILE_ERROR, [&] { return load_database(path); });
 }
@@ -73,20 +87,6 @@ VX_STATUS VRX::hxb_write(const char* path) {
     return guarded("storing", path, VX_FILE_ERROR, [&] { return store_database(path); });
 }
 
-template <class Body>
-VX_STATUS VRX::guarded(const char* doing, const char* path, VX_STATUS failed, Body&& body) {
-    try {
-        return body();
-    } catch (const std::bad_alloc&) {
-        abandon_files();
-        report_out_of_memory(doing, path);
-        return failed;
-    } catch (const HostException& host) {
-        abandon_files();
-        std::rethrow_exception(host.error);
-    }
-}
-
 // A database file left open by an exception: a write's temporary file goes.
 void VRX::abandon_files() {
     if (db_file == nullptr || !db_file->is_open()) return;
@@ -95,21 +95,28 @@ void VRX::abandon_files() {
 }
 
 // "out of memory while building design 'top'", "... storing library 'lib'
-// in 'lib.hxl'": the design (or library) in hand, and the file.
+// in 'lib.hxl'": the design (or library) in hand, and the file. Composed
+// without the heap, which may still be short; should the report itself run
+// out, the exit handler is called all the same.
 void VRX::report_out_of_memory(const char* doing, const char* path) const {
-    const bool whole_library = std::strcmp(doing, "storing") == 0 ? !is_design : design == nullptr;
+    const bool storing = std::strcmp(doing, "storing") == 0;
+    const bool whole_library = storing ? !is_design : design == nullptr;
     const char* name = whole_library ? (library ? library->get_name() : nullptr)
                                      : (design ? design->get_name() : nullptr);
-    std::string what = doing;
-    if (std::strcmp(doing, "loading") != 0 && name != nullptr)
-        what += UT_STR::Format(" %s '%s'", whole_library ? "library" : "design", name);
-    if (path != nullptr) {
-        const char* preposition = std::strcmp(doing, "writing") == 0   ? " to"
-                                  : std::strcmp(doing, "storing") == 0 ? " in"
-                                                                       : "";
-        what += UT_STR::Format("%s '%s'", preposition, path);
+    if (std::strcmp(doing, "loading") == 0) name = nullptr;
+    char subject[400] = "";
+    if (name != nullptr)
+        std::snprintf(subject, sizeof subject, " %s '%.300s'", whole_library ? "library" : "design",
+                      name);
+    char file[400] = "";
+    if (path != nullptr)
+        std::snprintf(file, sizeof file, "%s '%.300s'",
+                      storing ? " in" : (std::strcmp(doing, "writing") == 0 ? " to" : ""), path);
+    try {
+        converter_msg(__LINE__).issueFatal(2, "out of memory while %s%s%s\n", doing, subject, file);
+    } catch (const std::bad_alloc&) {
+        Port_MsgDispatcher::exit(2);
     }
-    converter_msg(__LINE__).issueFatal(2, "out of memory while %s\n", what.c_str());
 }
 
 // --- VRX -----------------------------------------------------------------------
