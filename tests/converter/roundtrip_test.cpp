@@ -412,8 +412,8 @@ TEST(DepthRoundTrip, HundredThousandLevelsCrossFilesGraftsAndTheWriter) {
         hx_env.delete_library(read.get_library());
     }
     HX_DESIGN* outer = library->create_design("outer");
-    auto* root = outer->create_logblock(nullptr, 0, "outer");
-    HX_LOGBLOCK* instance = outer->instantiate(root, chain, 1);
+    HX_LOGBLOCK* instance =
+        outer->instantiate(outer->create_logblock(nullptr, 0, "outer"), chain, 1);
     ASSERT_NE(outer->graft(instance, chain, 0, 0, nullptr, 0), nullptr);
     EXPECT_EQ(deepest(*outer), kDepth + 1);
     hx_env.delete_library(library);

@@ -316,19 +316,15 @@ TEST_F(Vrx2hxbTest, ErrorLimitEndsTheRunWithStatus2) {
     EXPECT_TRUE(tmp_.entries().empty());
 }
 
-// Each design grafts the one before twice: 2^40 gates from a few kilobytes.
+// Each design grafts the one before twice: 2^40 blocks from a few kilobytes.
 // Under a memory limit the run ends as a fatal error, and writes nothing.
 TEST_F(Vrx2hxbTest, RunningOutOfMemoryIsFatalAndLeavesNoFile) {
     if (VRX_SANITIZED) GTEST_SKIP() << "the sanitizers' shadow memory does not fit the limit";
-    std::string text = kTop;
+    std::string text = "DESIGN d0 { BLOCK d0 1 { PIN a (TYPE=IN CONN=a) } }\n";
     for (int i = 1; i <= 40; ++i) {
-        const std::string inner = i == 1 ? "top" : "d" + std::to_string(i - 1);
-        text += "DESIGN d" + std::to_string(i) + " {\n BLOCK d" + std::to_string(i) +
-                " 2 { PIN a (TYPE=IN CONN=a) PIN y (TYPE=OUT CONN=y) }\n";
-        for (const char* use : {" (NAME=u1) { PIN a (CONN=a) PIN y (CONN=m) }\n",
-                                " (NAME=u2) { PIN a (CONN=m) PIN y (CONN=y) }\n"})
-            text += " BLOCK " + inner + " 2" + use;
-        text += "}\n";
+        const std::string d = "d" + std::to_string(i), use = " BLOCK d" + std::to_string(i - 1);
+        text += "DESIGN " + d + " { BLOCK " + d + " 1 { PIN a (TYPE=IN CONN=a) }" + use +
+                " 1 (NAME=u1) { PIN a (CONN=a) }" + use + " 1 (NAME=u2) { PIN a (CONN=a) } }\n";
     }
     const std::string path = input("doubling.vrx", text.c_str());
     const ToolRun r = vrx_test::run_tool(
