@@ -254,8 +254,9 @@ void VRX::write_library() {
     while (HX_LIBLINK* link = links->l_next())
         vx_section_names(*link->get_design(), sections);
     library->delete_liblink_iter(links);
-    links = library->create_liblink_iter();
-    while (HX_LIBLINK* link = links->l_next()) {
+    // Owned, so that an exception of the host's progress hook leaks nothing.
+    const std::unique_ptr<UT_BLIST_ITER<HX_LIBLINK>> designs(library->create_liblink_iter());
+    while (HX_LIBLINK* link = designs->l_next()) {
         design = link->get_design();
         if (sections.contains(vx_text(design->get_name()))) {
             write_msg(__LINE__).issueStatus(
@@ -267,7 +268,6 @@ void VRX::write_library() {
                                         vx_text(design->get_name()));
         write_design();
     }
-    library->delete_liblink_iter(links);
     for (const auto& [alias, target] : library->aliases()) {
         const VX_LEGALNAME name = vrx_legal(target->get_name(), target).keep();
         write_indent(3, "DESIGN", name.view(), vrx_legal(alias.c_str(), target).view());

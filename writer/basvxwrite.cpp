@@ -91,7 +91,8 @@ template <class Fn>
 void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
     if (block->child_count() == 0) return;
     HX_BLOCK* batch[kBatch];
-    UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
+    // Owned, so that an exception of the host's progress hook leaks nothing.
+    const std::unique_ptr<UT_BLIST_ITER<HX_BLOCK>> iter(block->create_child_iter());
     for (;;) {
         int count = 0;
         while (count < kBatch) {
@@ -104,7 +105,6 @@ void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
         for (int c = 0; c < count; ++c)
             fn(batch[c]);
     }
-    block->delete_child_iter(iter);
 }
 
 bool sits_in_root(const HX_BLOCK* block) {
