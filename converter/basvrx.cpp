@@ -1,6 +1,10 @@
 // The converter object: construction, copies, the active converter, the
 // progress hook and the signal caches.
 #include <algorithm>
+#include <cstdio>
+#include <cstring>
+#include <exception>
+#include <new>
 
 #include "hxb_propfilter.h"
 #include "port_msg.h"
@@ -15,7 +19,105 @@ namespace {
 
 constexpr uint16_t kNoIndex = 0xFFFF;
 
+Port_MsgManData converter_msg(int line) {
+    return Port_MsgManData::createObject("Quorra", "../s/basvrx", line, "$Revision: 1.2 $");
+}
+
+// An exception of the host's progress hook on its way back to the host,
+// past the library's own handlers (a host may throw std::bad_alloc too).
+struct HostException {
+    std::exception_ptr error;
+};
+
+// The reader's statements go to the converter that reads, a copy included,
+// for the length of its read.
+class ReaderTarget {
+  public:
+    explicit ReaderTarget(VRX* reader) : before_(active_vrx) { active_vrx = reader; }
+    ReaderTarget(const ReaderTarget&) = delete;
+    ReaderTarget& operator=(const ReaderTarget&) = delete;
+    ~ReaderTarget() { active_vrx = before_; }
+
+  private:
+    VRX* before_;
+};
+
 }  // namespace
+
+// --- the conversions ---------------------------------------------------------------
+
+template <class Body>
+VX_STATUS VRX::guarded(const char* doing, const char* path, VX_STATUS failed, Body&& body) {
+    try {
+        return body();
+    } catch (const std::bad_alloc&) {
+        abandon_files();
+        report_out_of_memory(doing, path);
+        return failed;
+    } catch (const HostException& host) {
+        abandon_files();
+        std::rethrow_exception(host.error);
+    }
+}
+
+VX_STATUS VRX::hxb_read(const char* path) {
+    return guarded("loading", path, VX_FILE_ERROR, [&] { return load_database(path); });
+}
+
+VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit_user_flag) {
+    return guarded("writing", path, VX_FILE_ERROR,
+                   [&] { return write_text(path, filter_file, omit_user_flag); });
+}
+
+VX_STATUS VRX::vrx_read(const char* name, uint8_t design_flag, uint8_t physroot_flag,
+                        uint8_t nograft_flag) {
+    DARRAY_NAME names;
+    names.add(name);
+    return vrx_read(names, design_flag, physroot_flag, nograft_flag);
+}
+
+VX_STATUS VRX::vrx_read(const DARRAY_NAME& names, uint8_t design_flag, uint8_t physroot_flag,
+                        uint8_t nograft_flag) {
+    const ReaderTarget target(this);
+    return guarded("building", nullptr, VX_PARSE_ERROR,
+                   [&] { return read_texts(names, design_flag, physroot_flag, nograft_flag); });
+}
+
+VX_STATUS VRX::hxb_write(const char* path) {
+    return guarded("storing", path, VX_FILE_ERROR, [&] { return store_database(path); });
+}
+
+// A database file left open by an exception: a write's temporary file goes.
+void VRX::abandon_files() {
+    if (db_file == nullptr || !db_file->is_open()) return;
+    db_file->fail();
+    Port::File::close(db_file);
+}
+
+// "out of memory while building design 'top'", "... storing library 'lib'
+// in 'lib.hxl'": the design (or library) in hand, and the file. Composed
+// without the heap, which may still be short; should the report itself run
+// out, the exit handler is called all the same.
+void VRX::report_out_of_memory(const char* doing, const char* path) const {
+    const bool storing = std::strcmp(doing, "storing") == 0;
+    const bool whole_library = storing ? !is_design : design == nullptr;
+    const char* name = whole_library ? (library ? library->get_name() : nullptr)
+                                     : (design ? design->get_name() : nullptr);
+    if (std::strcmp(doing, "loading") == 0) name = nullptr;
+    char subject[400] = "";
+    if (name != nullptr)
+        std::snprintf(subject, sizeof subject, " %s '%.300s'", whole_library ? "library" : "design",
+                      name);
+    char file[400] = "";
+    if (path != nullptr)
+        std::snprintf(file, sizeof file, "%s '%.300s'",
+                      storing ? " in" : (std::strcmp(doing, "writing") == 0 ? " to" : ""), path);
+    try {
+        converter_msg(__LINE__).issueFatal(2, "out of memory while %s%s%s\n", doing, subject, file);
+    } catch (const std::bad_alloc&) {
+        Port_MsgDispatcher::exit(2);
+    }
+}
 
 // --- VRX -----------------------------------------------------------------------
 
@@ -44,8 +146,7 @@ VRX::VRX()
       phys_root(nullptr),
       lookups(std::make_unique<VX_LOOKUPS>()) {
     if (active_vrx != nullptr) {
-        Port_MsgManData::createObject("Quorra", "../s/basvrx", __LINE__, "$Revision: 1.2 $")
-            .issueFatal(2, "multiple concurrent VX objects\n");
+        converter_msg(__LINE__).issueFatal(2, "multiple concurrent VX objects\n");
     }
     active_vrx = this;
     std::fill(std::begin(curr_indices), std::end(curr_indices), kNoIndex);
@@ -131,6 +232,14 @@ void VRX::begin_progress(const char* verb, const char* path) {
     progress_what = verb;
     progress_what += ' ';
     progress_what += vx_text(path);
+}
+
+void VRX::call_progress(uint64_t done, uint64_t total) const {
+    try {
+        progress_fn(progress_context, progress_what.c_str(), done, total);
+    } catch (...) {
+        throw HostException{std::current_exception()};
+    }
 }
 
 void VRX::forward_progress(void* self, uint64_t done, uint64_t total) {

@@ -59,11 +59,28 @@ UT_TIMESTAMP header_time() {
     return UT_TIMESTAMP(static_cast<std::time_t>(seconds), UT_TIMESTAMP::UTC);
 }
 
+// Drops the stream of a write left unfinished by an exception (of the host's
+// progress hook, or out of memory) on its way out; the destination's own
+// guard removes the temporary file.
+class UnfinishedOutput {
+  public:
+    explicit UnfinishedOutput(Port::Stream*& stream) : stream_(stream) {}
+    UnfinishedOutput(const UnfinishedOutput&) = delete;
+    UnfinishedOutput& operator=(const UnfinishedOutput&) = delete;
+    ~UnfinishedOutput() {
+        delete stream_;
+        stream_ = nullptr;
+    }
+
+  private:
+    Port::Stream*& stream_;
+};
+
 }  // namespace
 
 // --- hxb_read ----------------------------------------------------------------------
 
-VX_STATUS VRX::hxb_read(const char* path) {
+VX_STATUS VRX::load_database(const char* path) {
     if (path == nullptr || *path == '\0') {
         write_msg(__LINE__).issueError("cannot open input file '%s'\n", "");
         return VX_FILE_ERROR;
@@ -119,7 +136,7 @@ VX_STATUS VRX::hxb_read(const char* path) {
 
 // --- vrx_write ---------------------------------------------------------------------
 
-VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit_user_flag) {
+VX_STATUS VRX::write_text(const char* path, const char* filter_file, uint8_t omit_user_flag) {
     omit_user = omit_user_flag;
     if ((is_design ? static_cast<void*>(design) : static_cast<void*>(library)) == nullptr) {
         write_msg(__LINE__).issueError("no design or library has been read to write to '%s'\n",
@@ -155,6 +172,7 @@ VX_STATUS VRX::vrx_write(const char* path, const char* filter_file, uint8_t omit
     delete out_stream;
     out_stream = new Port::Stream(Port::ACCESS_WRITE, 4096);
     out_stream->attach(out.fd(), out.temp_name().c_str(), false);
+    const UnfinishedOutput unfinished(out_stream);
     write_msg(__LINE__).issueStatus("   writing VRX file '%s' ...\n", path);
     begin_progress("writing", path);
 
@@ -259,8 +277,9 @@ void VRX::write_library() {
     write_props(library, &opened);
     if (opened) write_string(")", "\r\n");
     const std::unordered_map<std::string, HX_BLOCK*> sections = library_sections();
-    UT_BLIST_ITER<HX_LIBLINK>* links = library->create_liblink_iter();
-    while (HX_LIBLINK* link = links->l_next()) {
+    // Owned, so that an exception of the host's progress hook leaks nothing.
+    const std::unique_ptr<UT_BLIST_ITER<HX_LIBLINK>> designs(library->create_liblink_iter());
+    while (HX_LIBLINK* link = designs->l_next()) {
         design = link->get_design();
         const char* name = vx_text(design->get_name());
         const auto section = sections.find(section_key(name));
@@ -278,7 +297,6 @@ void VRX::write_library() {
         write_msg(__LINE__).issueStatus("   processing design %s ...\n", name);
         write_design();
     }
-    library->delete_liblink_iter(links);
     for (const auto& [alias, target] : library->aliases()) {
         const VX_LEGALNAME name = vrx_legal(target->get_name(), target).keep();
         write_indent(3, "DESIGN", name.view(), vrx_legal(alias.c_str(), target).view());

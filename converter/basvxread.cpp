@@ -136,15 +136,8 @@ uint64_t file_size(const char* path) {
 
 }  // namespace
 
-VX_STATUS VRX::vrx_read(const char* name, uint8_t design_flag, uint8_t physroot_flag,
-                        uint8_t nograft_flag) {
-    DARRAY_NAME names;
-    names.add(name);
-    return vrx_read(names, design_flag, physroot_flag, nograft_flag);
-}
-
-VX_STATUS VRX::vrx_read(const DARRAY_NAME& names, uint8_t design_flag, uint8_t physroot_flag,
-                        uint8_t nograft_flag) {
+VX_STATUS VRX::read_texts(const DARRAY_NAME& names, uint8_t design_flag, uint8_t physroot_flag,
+                          uint8_t nograft_flag) {
     is_design = design_flag;
     make_physroot = physroot_flag;
     nograft = nograft_flag;
@@ -318,7 +311,7 @@ bool output_name(const char* path, const char* first_input, const char* extensio
 
 }  // namespace
 
-VX_STATUS VRX::hxb_write(const char* path) {
+VX_STATUS VRX::store_database(const char* path) {
     std::string out;
     if (!output_name(path, first_input, is_design ? "hxb" : "hxl", out)) {
         read_msg(__LINE__).issueError(

@@ -33,6 +33,13 @@ class HX_PROPERTY;
 struct VX_LOOKUPS;
 
 /// Result of the public conversion operations.
+///
+/// No exception of the library's leaves a conversion. Running out of memory
+/// ends it like any other fatal condition: a fatal report naming what was
+/// being built, then the host's exit handler with code 2 (the default one
+/// ends the process); when the handler returns, the call returns
+/// VX_PARSE_ERROR (vrx_read) or VX_FILE_ERROR (the others), with no
+/// temporary file left.
 enum VX_STATUS : int32_t {
     VX_OK = 0,
     VX_FILE_ERROR = 1,   // a file could not be opened, read or written; a bad filter file
@@ -56,6 +63,11 @@ const char* vrx_library_version();
 /// (kilobytes of text, thousands of objects), often many a second: the host
 /// decides how often to show them. The hook runs on the converter's thread
 /// inside the conversion call and must not use the converter.
+///
+/// An exception thrown by the hook is the host's: it leaves the conversion
+/// call after the conversion has cleaned up (files closed, a temporary file
+/// removed, nothing leaked); the destination is left as it was, and the
+/// converter is ready for the next call.
 using VX_PROGRESS_FN = void (*)(void* context, const char* what, uint64_t done, uint64_t total);
 
 /// Signals of the design being read, by name. Entries are non-owning
@@ -84,8 +96,9 @@ class VRX {
     /// A copy shares the database objects and duplicates what it owns: the
     /// first input name is copied; the file object, the property filter and
     /// the device description stay with the source (the copy has none); the
-    /// signal caches and the progress hook are copied. A copy never becomes
-    /// the active converter.
+    /// signal caches and the progress hook are copied. A copy becomes the
+    /// active converter only for the length of its own vrx_read, so that
+    /// what it reads, and the parse's outcome, are its own.
     VRX(const VRX& other);
     VRX& operator=(const VRX& other);
 
@@ -162,13 +175,26 @@ class VRX {
     void copy_from(const VRX& other);
     void release_owned();
 
+    // The bodies of the public conversions, which run them through `guarded`:
+    // out of memory is a fatal report, and a host's exception from the
+    // progress hook reaches the caller after the files are let go.
+    VX_STATUS load_database(const char* path);
+    VX_STATUS write_text(const char* path, const char* filter_file, uint8_t omit_user);
+    VX_STATUS read_texts(const DARRAY_NAME& names, uint8_t is_design, uint8_t make_physroot,
+                         uint8_t nograft);
+    VX_STATUS store_database(const char* path);
+    template <class Body>
+    VX_STATUS guarded(const char* doing, const char* path, VX_STATUS failed, Body&& body);
+    void abandon_files();
+    void report_out_of_memory(const char* doing, const char* path) const;
+
     // Progress reports (see set_progress): the step reported, and the
     // forwarders of the reader's and the database's own hooks.
     void begin_progress(const char* verb, const char* path);
     void report_progress(uint64_t done, uint64_t total) const {
-        if (progress_fn != nullptr)
-            progress_fn(progress_context, progress_what.c_str(), done, total);
+        if (progress_fn != nullptr) call_progress(done, total);
     }
+    void call_progress(uint64_t done, uint64_t total) const;
     void report_write_progress(bool complete);
     static void forward_progress(void* self, uint64_t done, uint64_t total);
     static void forward_scan_progress(void* self, uint64_t done);

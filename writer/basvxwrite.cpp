@@ -15,7 +15,9 @@
 #include <charconv>
 #include <cstdio>
 #include <cstring>
+#include <memory>
 #include <optional>
+#include <utility>
 #include <vector>
 
 #include "hx_design.h"
@@ -37,13 +39,26 @@ std::string_view number_text(char (&buffer)[16], long long value) {
     return std::string_view(buffer, static_cast<std::size_t>(r.ptr - buffer));
 }
 
+// Calls `fn` for every block below `top`, each after the blocks below it,
+// siblings in order. The walk keeps its own stack: a hierarchy may be far
+// deeper than the call stack would allow.
 template <class Fn>
-void for_each_child(const HX_BLOCK* block, Fn&& fn) {
-    if (block->child_count() == 0) return;
-    UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
-    while (HX_BLOCK* child = iter->l_next())
-        fn(child);
-    block->delete_child_iter(iter);
+void for_each_below(const HX_BLOCK* top, Fn&& fn) {
+    using Children = std::unique_ptr<UT_BLIST_ITER<HX_BLOCK>>;
+    std::vector<std::pair<HX_BLOCK*, Children>> stack;
+    stack.emplace_back(nullptr, Children(top->create_child_iter()));
+    while (!stack.empty()) {
+        HX_BLOCK* child = stack.back().second->l_next();
+        if (child != nullptr && child->child_count() != 0) {
+            stack.emplace_back(child, Children(child->create_child_iter()));
+        } else if (child != nullptr) {
+            fn(child);
+        } else {
+            HX_BLOCK* done = stack.back().first;
+            stack.pop_back();
+            if (done != nullptr) fn(done);
+        }
+    }
 }
 
 // Child statements name the signals on the children's pins, which lie
@@ -80,7 +95,8 @@ template <class Fn>
 void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
     if (block->child_count() == 0) return;
     HX_BLOCK* batch[kBatch];
-    UT_BLIST_ITER<HX_BLOCK>* iter = block->create_child_iter();
+    // Owned, so that an exception of the host's progress hook leaks nothing.
+    const std::unique_ptr<UT_BLIST_ITER<HX_BLOCK>> iter(block->create_child_iter());
     for (;;) {
         int count = 0;
         while (count < kBatch) {
@@ -93,7 +109,6 @@ void for_each_child_ahead(const HX_BLOCK* block, Fn&& fn) {
         for (int c = 0; c < count; ++c)
             fn(batch[c]);
     }
-    block->delete_child_iter(iter);
 }
 
 bool sits_in_root(const HX_BLOCK* block) {
@@ -339,16 +354,20 @@ void VRX::write_signal_props(HX_BLOCK* block) {
     signal_section = nullptr;
 }
 
-void VRX::write_map_signals(HX_BASEPHYSBLOCK* block) {
-    for_each_child(
-        block, [&](HX_BLOCK* child) { write_map_signals(static_cast<HX_BASEPHYSBLOCK*>(child)); });
-    std::optional<VX_LEGALNAME> label;  // made when a statement needs it
-    for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
-        const HX_PIN* pin = block->get_pin(i);
-        if (pin->get_map_signal() != nullptr)
-            write_pin_mapsignal(block, pin, mapsignal_label(block, label));
-    }
-    write_unmapped_children(block, label);
+// The blocks below `root` first, deepest first, then the root's own.
+void VRX::write_map_signals(HX_BASEPHYSBLOCK* root) {
+    auto write_own = [&](HX_BLOCK* plain) {
+        auto* block = static_cast<HX_BASEPHYSBLOCK*>(plain);
+        std::optional<VX_LEGALNAME> label;  // made when a statement needs it
+        for (uint16_t i = 0; i < block->get_pin_count(); ++i) {
+            const HX_PIN* pin = block->get_pin(i);
+            if (pin->get_map_signal() != nullptr)
+                write_pin_mapsignal(block, pin, mapsignal_label(block, label));
+        }
+        write_unmapped_children(block, label);
+    };
+    for_each_below(root, write_own);
+    write_own(root);
 }
 
 const VX_LEGALNAME& VRX::mapsignal_label(HX_BASEPHYSBLOCK* block,
@@ -424,15 +443,16 @@ void VRX::write_design() {
     write_root_design();
 }
 
-void VRX::write_contents(HX_BLOCK* block, uint8_t physical) {
-    if (block == nullptr) return;
-    for_each_child(block, [&](HX_BLOCK* child) { traverse(child, physical); });
+// A section for every block with children below `root`, deepest first.
+void VRX::write_contents(HX_BLOCK* root, uint8_t physical) {
+    if (root == nullptr) return;
+    for_each_below(root, [&](HX_BLOCK* block) {
+        if (block->child_count() != 0) traverse(block, physical);
+    });
 }
 
+// The section of one block with children.
 void VRX::traverse(HX_BLOCK* block, uint8_t physical) {
-    if (block->child_count() == 0) return;
-    for_each_child(block, [&](HX_BLOCK* child) { traverse(child, physical); });
-
     const char* plain = block->get_name();
     const char* hier = build_hiername(block);
     VX_LEGALNAME design_name;

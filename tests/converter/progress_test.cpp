@@ -3,11 +3,13 @@
 #include <gtest/gtest.h>
 
 #include <cstdint>
+#include <new>
 #include <string>
 #include <vector>
 
 #include "chain_netlist.h"
 #include "msg_capture.h"
+#include "scoped_env.h"
 #include "scratch_dir.h"
 #include "vrx.h"
 
@@ -40,6 +42,12 @@ void expect_step(std::vector<Report>& reports, const char* verb, const std::stri
     EXPECT_EQ(reports.back().done, size);
     EXPECT_EQ(reports.back().total, size);
     reports.clear();
+}
+
+// A host's hook that fails the way the library itself might: its exception
+// is the host's all the same.
+void refuse(void*, const char*, uint64_t, uint64_t) {
+    throw std::bad_alloc();
 }
 
 class ProgressTest : public ::testing::Test {
@@ -101,6 +109,37 @@ TEST_F(ProgressTest, HooksEndWithTheirConversion) {
     ASSERT_EQ(vrx.hxb_write(db.c_str()), VX_OK);
     ASSERT_EQ(vrx.hxb_read(db.c_str()), VX_OK);
     EXPECT_TRUE(reports_.empty());
+}
+
+// Each conversion lets go of its files before a hook's exception reaches the
+// caller: no temporary file, no destination, and the converter works on.
+TEST_F(ProgressTest, HookExceptionsReachTheCallerAfterCleanUp) {
+    ScratchDir out;
+    ScratchDir tmp;
+    const ScopedEnv tmpdir("TMPDIR", tmp.path().c_str());
+    const std::string text = dir_->file("chain.vrx");
+    const std::string db = out.file("chain.hxb");
+    const std::string back = out.file("back.vrx");
+    VRX vrx;
+    ASSERT_EQ(vrx.vrx_read(text.c_str(), 1, 0, 0), VX_OK);
+    vrx.set_progress(refuse, nullptr);
+    EXPECT_THROW(vrx.hxb_write(db.c_str()), std::bad_alloc);
+    EXPECT_THROW(vrx.vrx_write(back.c_str(), nullptr, 0), std::bad_alloc);
+    EXPECT_TRUE(out.entries().empty());
+    EXPECT_TRUE(tmp.entries().empty());
+
+    vrx.set_progress(nullptr, nullptr);
+    ASSERT_EQ(vrx.hxb_write(db.c_str()), VX_OK);
+    vrx.set_progress(refuse, nullptr);
+    EXPECT_THROW(vrx.hxb_read(db.c_str()), std::bad_alloc);
+    EXPECT_THROW(vrx.vrx_read(text.c_str(), 1, 0, 0), std::bad_alloc);
+    EXPECT_TRUE(capture_.exits().empty());  // not taken for running out of memory
+
+    vrx.set_progress(nullptr, nullptr);
+    EXPECT_EQ(vrx.vrx_read(text.c_str(), 1, 0, 0), VX_OK);
+    EXPECT_EQ(vrx.hxb_read(db.c_str()), VX_OK);
+    EXPECT_EQ(vrx.vrx_write(back.c_str(), nullptr, 0), VX_OK);
+    EXPECT_EQ(out.entries(), (std::vector<std::string>{"back.vrx", "chain.hxb"}));
 }
 
 }  // namespace

@@ -332,4 +332,66 @@ TEST(DatabaseRoundTrip, ExpressibleRandomLibrariesComeBackEqual) {
     }
 }
 
+// --- Depth ---------------------------------------------------------------------
+
+/// `depth` unnamed blocks below the root, each inside the one before, and a
+/// net through every level, from the root's pin to the innermost block.
+HX_DESIGN* make_chain(HX_LIBRARY& library, const char* name, uint32_t depth) {
+    HX_DESIGN* design = library.create_design(name);
+    HX_BLOCK* block = design->create_logblock(nullptr, 1, name);
+    block->get_pin(0)->set_name("p");
+    block->get_pin(0)->set_dir(HX_PIN_IN);
+    for (uint32_t level = 1; level <= depth; ++level) {
+        HX_SIGNAL* net = design->create_signal(block, "n");
+        design->create_conn(net, block, 0);
+        block = design->create_logblock(static_cast<HX_BASELOGBLOCK*>(block), 1, nullptr);
+        block->get_pin(0)->set_name("p");
+        block->get_pin(0)->set_dir(HX_PIN_IN);
+        design->create_conn(net, block, 0);
+    }
+    return design;
+}
+
+uint32_t deepest(const HX_DESIGN& design) {
+    uint32_t depth = 0;
+    for (size_t i = 0; i < design.block_count(); ++i)
+        depth = std::max(depth, design.block_at(i)->get_depth());
+    return depth;
+}
+
+// Deeper than any call stack: every walk over the hierarchy keeps its own
+// stack. Unnamed blocks keep the text linear in depth (a named level
+// repeats the names above it).
+TEST(DepthRoundTrip, HundredThousandLevelsCrossFilesGraftsAndTheWriter) {
+    constexpr uint32_t kDepth = 100'000;
+    ScratchDir dir;
+    HX_LIBRARY* library = hx_env.create_library("deep", 0);
+    HX_DESIGN* chain = make_chain(*library, "chain", kDepth);
+    const std::string hxb = dir.file("chain.hxb");
+    ASSERT_TRUE(store(hxb, chain, nullptr));
+    {
+        MsgCapture capture;
+        VRX vrx;
+        ASSERT_EQ(vrx.hxb_read(hxb.c_str()), VX_OK) << reports(capture);
+        const HX_DESIGN& read = *vrx.get_design();
+        EXPECT_EQ(read.block_count(), kDepth + 1);
+        EXPECT_EQ(deepest(read), kDepth);
+        EXPECT_EQ(read.network_count(), 1u);
+        const std::string text = dir.file("chain.vrx");
+        ASSERT_EQ(vrx.vrx_write(text.c_str(), nullptr, 0), VX_OK) << reports(capture);
+        const std::string written = ScratchDir::read_file(text);
+        std::size_t sections = 0;
+        for (std::size_t at = 0; (at = written.find("\nDESIGN ", at)) != std::string::npos; ++at)
+            ++sections;
+        EXPECT_EQ(sections, kDepth);
+        hx_env.delete_library(read.get_library());
+    }
+    HX_DESIGN* outer = library->create_design("outer");
+    HX_LOGBLOCK* instance =
+        outer->instantiate(outer->create_logblock(nullptr, 0, "outer"), chain, 1);
+    ASSERT_NE(outer->graft(instance, chain, 0, 0, nullptr, 0), nullptr);
+    EXPECT_EQ(deepest(*outer), kDepth + 1);
+    hx_env.delete_library(library);
+}
+
 }  // namespace

@@ -1,9 +1,15 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cstdlib>
 #include <cstring>
+#include <string>
+#include <vector>
+
+#include <sys/resource.h>
 
 #include "msg_capture.h"
+#include "scratch_dir.h"
 #include "vrx.h"
 
 // Reaches the converter's private state for the tests.
@@ -88,6 +94,57 @@ TEST(ConverterTest, CopiesOwnTheirFirstInputAndLeaveTheActiveConverterAlone) {
     // the active converter (the sanitizer build catches a double free).
     EXPECT_EQ(active_vrx, &vrx);
     EXPECT_STREQ(A::first_input(vrx), "design.vrx");
+}
+
+// A copy reads for itself, whether or not its source is still there, and
+// reports its own parse's outcome.
+TEST(ConverterTest, CopiesReadTheirOwnTextAndStatus) {
+    MsgCapture capture;
+    ScratchDir dir;
+    const std::string good = dir.file("good.vrx");
+    const std::string bad = dir.file("bad.vrx");
+    ScratchDir::write_file(good, "DESIGN top { BLOCK top 1 { PIN a (TYPE=IN) } }\n");
+    ScratchDir::write_file(bad, "DESIGN top { BLOCK top 1 { PIN a (TYPE=IN) }\n");
+    auto source = std::make_unique<VRX>();
+    VRX copy(*source);
+    EXPECT_EQ(copy.vrx_read(bad.c_str(), 1, 0, 0), VX_PARSE_ERROR);
+    EXPECT_EQ(copy.vrx_read(good.c_str(), 1, 0, 0), VX_OK);
+    ASSERT_NE(copy.get_design(), nullptr);
+    EXPECT_EQ(source->get_design(), nullptr);
+    EXPECT_EQ(active_vrx, source.get());
+    source.reset();
+    EXPECT_EQ(copy.vrx_read(bad.c_str(), 1, 0, 0), VX_PARSE_ERROR);
+    EXPECT_EQ(active_vrx, nullptr);
+    hx_env.delete_library(copy.get_library());
+}
+
+// Reads `path` under a memory limit, as a host whose exit handler returns:
+// 0 when the read ends in one fatal report and an error status.
+int read_out_of_memory(const std::string& path) {
+    const rlimit limit{300u << 20, 300u << 20};
+    setrlimit(RLIMIT_AS, &limit);
+    MsgCapture capture;
+    VRX vrx;
+    const VX_STATUS status = vrx.vrx_read(path.c_str(), 1, 0, 0);
+    const std::vector<std::string> fatal = capture.texts(PORT_MSG_FATAL);
+    const bool reported = fatal.size() == 1 && capture.exits() == std::vector<int>{2} &&
+                          fatal[0].starts_with("out of memory while building design 'd");
+    return status == VX_PARSE_ERROR && reported ? 0 : 1;
+}
+
+// Each design grafts the one before twice; no exception reaches the host.
+TEST(ConverterTest, RunningOutOfMemoryReturnsAnErrorToAHostThatCarriesOn) {
+    if (VRX_SANITIZED) GTEST_SKIP() << "the sanitizers' shadow memory does not fit the limit";
+    ScratchDir dir;
+    std::string text = "DESIGN d0 { BLOCK d0 1 { PIN a (TYPE=IN CONN=a) } }\n";
+    for (int i = 1; i <= 40; ++i) {
+        const std::string d = "d" + std::to_string(i), use = " BLOCK d" + std::to_string(i - 1);
+        text += "DESIGN " + d + " { BLOCK " + d + " 1 { PIN a (TYPE=IN CONN=a) }" + use +
+                " 1 (NAME=u1) { PIN a (CONN=a) }" + use + " 1 (NAME=u2) { PIN a (CONN=a) } }\n";
+    }
+    ScratchDir::write_file(dir.file("doubling.vrx"), text);
+    EXPECT_EXIT(std::_Exit(read_out_of_memory(dir.file("doubling.vrx"))),
+                ::testing::ExitedWithCode(0), "");
 }
 
 TEST(SignalCacheTest, FindOrCreateMakesEachNameOnceInTheRightRoot) {

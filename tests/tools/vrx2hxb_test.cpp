@@ -341,4 +341,26 @@ TEST_F(Vrx2hxbTest, ErrorLimitEndsTheRunWithStatus2) {
     EXPECT_TRUE(tmp_.entries().empty());
 }
 
+// Each design grafts the one before twice: 2^40 blocks from a few kilobytes.
+// Under a memory limit the run ends as a fatal error, and writes nothing.
+TEST_F(Vrx2hxbTest, RunningOutOfMemoryIsFatalAndLeavesNoFile) {
+    if (VRX_SANITIZED) GTEST_SKIP() << "the sanitizers' shadow memory does not fit the limit";
+    std::string text = "DESIGN d0 { BLOCK d0 1 { PIN a (TYPE=IN CONN=a) } }\n";
+    for (int i = 1; i <= 40; ++i) {
+        const std::string d = "d" + std::to_string(i), use = " BLOCK d" + std::to_string(i - 1);
+        text += "DESIGN " + d + " { BLOCK " + d + " 1 { PIN a (TYPE=IN CONN=a) }" + use +
+                " 1 (NAME=u1) { PIN a (CONN=a) }" + use + " 1 (NAME=u2) { PIN a (CONN=a) } }\n";
+    }
+    const std::string path = input("doubling.vrx", text.c_str());
+    const ToolRun r = vrx_test::run_tool(
+        "/bin/sh", {"-c", "ulimit -v 300000 && exec \"$0\" \"$@\"", VRX2HXB_PATH, path},
+        {dir_.path(), tmp_.path(), capture_.path(), ""});
+    EXPECT_EQ(r.status, 2);
+    EXPECT_NE(r.err.find("FATAL_ERROR:Quorra - out of memory while building design 'd"),
+              std::string::npos)
+        << r.err;
+    EXPECT_EQ(dir_.entries(), (std::vector<std::string>{"doubling.vrx"}));
+    EXPECT_TRUE(tmp_.entries().empty());
+}
+
 }  // namespace

@@ -73,12 +73,14 @@ std::byte* map_pages(std::size_t size, std::size_t align) {
 }  // namespace
 
 HX_ARENA::~HX_ARENA() {
-    for (const Chunk& chunk : chunks_) {
-        if (chunk.mapped) {
-            munmap(chunk.start, chunk.size);
+    for (Chunk* chunk = last_; chunk != nullptr;) {
+        Chunk* prev = chunk->prev;
+        if (chunk->mapped) {
+            munmap(chunk, chunk->size);
         } else {
-            std::free(chunk.start);
+            std::free(chunk);
         }
+        chunk = prev;
     }
 }
 
@@ -100,27 +102,30 @@ void HX_ARENA::make_room(std::size_t size, std::size_t align) {
     left_ = static_cast<std::size_t>(want - cur_);
 }
 
+// Each chunk starts with its Chunk record, which links it to the one before.
 void HX_ARENA::grow(std::size_t at_least) {
-    std::size_t size = std::max(next_chunk_, at_least);
-    Chunk chunk{nullptr, size, size >= kMappedChunk};
-    if (!chunk.mapped) {
-        chunk.start = static_cast<std::byte*>(std::malloc(size));
-        if (chunk.start == nullptr) throw std::bad_alloc();
+    std::size_t size = std::max(next_chunk_, at_least + sizeof(Chunk));
+    const bool mapped = size >= kMappedChunk;
+    std::byte* start = nullptr;
+    if (!mapped) {
+        start = static_cast<std::byte*>(std::malloc(size));
+        if (start == nullptr) throw std::bad_alloc();
         left_ = size;
     } else if (reserved_ >= kHugeFrom && size % kHugePage == 0) {
-        chunk.start = map_pages(size, kHugePage);
+        start = map_pages(size, kHugePage);
 #ifdef MADV_HUGEPAGE
-        madvise(chunk.start, size, MADV_HUGEPAGE);
+        madvise(start, size, MADV_HUGEPAGE);
 #endif
         left_ = size;  // a fault per huge page is cheap enough
     } else {
-        chunk.size = size = (size + kPage - 1) & ~(kPage - 1);
-        chunk.start = map_pages(size, kPage);
-        left_ = 0;  // make_room faults in what is used
+        size = (size + kPage - 1) & ~(kPage - 1);
+        start = map_pages(size, kPage);
+        left_ = sizeof(Chunk);  // make_room faults in the rest as it is used
     }
-    chunks_.push_back(chunk);
-    cur_ = chunk.start;
-    chunk_end_ = chunk.start + size;
+    last_ = new (start) Chunk{last_, size, mapped};
+    cur_ = start + sizeof(Chunk);
+    left_ -= sizeof(Chunk);
+    chunk_end_ = start + size;
     reserved_ += size;
     next_chunk_ = std::min(next_chunk_ * 2, kLargestChunk);
 }

@@ -22,6 +22,7 @@
 #include "hx_types.h"
 #include "ut_blist_iter.h"
 #include "ut_darray.h"
+#include "ut_lazy_map.h"
 
 class HX_BLOCK;
 class HX_BASELOGBLOCK;
@@ -549,10 +550,10 @@ class HX_DESIGN : public HX_OBJECT {
     size_t network_count_ = 0;
     std::vector<HX_SIGNAL*> globals_;
     std::vector<HX_MAPSIGNAL*> mapsignals_;
-    std::unordered_map<std::string_view, HX_SIGNAL*> global_by_name_;
-    std::unordered_map<const HX_PIN*, HX_MAPSIGNAL*> mapsignal_of_pin_;
-    std::unordered_map<const HX_BLOCK*, HX_BASEPHYSBLOCK*> phys_parent_;
-    std::unordered_map<const HX_BLOCK*, std::vector<HX_BLOCK*>> log_children_;
+    UT_LAZY_MAP<std::string_view, HX_SIGNAL*> global_by_name_;
+    UT_LAZY_MAP<const HX_PIN*, HX_MAPSIGNAL*> mapsignal_of_pin_;
+    UT_LAZY_MAP<const HX_BLOCK*, HX_BASEPHYSBLOCK*> phys_parent_;
+    UT_LAZY_MAP<const HX_BLOCK*, std::vector<HX_BLOCK*>> log_children_;
     uint32_t last_tag_ = 0;
     mutable std::string name_buffer_;
 };

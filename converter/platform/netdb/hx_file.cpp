@@ -173,6 +173,12 @@ struct BigAlloc {
 template <class T>
 using BigVector = std::vector<T, BigAlloc<T>>;
 
+/// A refusal to write what the file's 32-bit counts and positions cannot
+/// hold; nothing is written then.
+struct TooLarge {
+    std::string what;
+};
+
 // --- little-endian output --------------------------------------------------------
 
 /// The file's bytes in chunks that never move, so that a count can be
@@ -197,6 +203,7 @@ class Output {
             return;
         }
         const std::size_t length = std::strlen(s);
+        if (length >= kAbsent) throw TooLarge{"a name or text of 4 GiB or more"};
         char* p = room(length + 5);
         store(p, static_cast<uint32_t>(length));
         std::memcpy(p + 4, s, length + 1);
@@ -514,7 +521,7 @@ class HX_FILE_IO::Encoder {
         out_.u8(library.get_casesense());
         out_.u8(note_props(library));
         designs_of(library);
-        out_.u32(static_cast<uint32_t>(designs_.size()));
+        out_.u32(field(designs_.size(), kAbsent - 1, "designs"));
         for (const HX_DESIGN* design : designs_)
             design_record(*design);
         aliases(library);
@@ -551,6 +558,17 @@ class HX_FILE_IO::Encoder {
     }
 
   private:
+    /// `n` for a 32-bit field that holds up to `limit`; beyond it the file
+    /// would hold a wrapped count, so the write is refused.
+    uint32_t field(std::size_t n, std::size_t limit, const char* what) const {
+        if (n <= limit) return static_cast<uint32_t>(n);
+        const HX_DESIGN* design = lists_.empty() ? nullptr : lists_.back().design;
+        const char* name = design != nullptr ? design->get_name() : nullptr;
+        throw TooLarge{UT_STR::Format("%s%s%s has more %s than a database file can hold (%zu)",
+                                      design ? "design '" : "the library", name ? name : "",
+                                      design ? "'" : "", what, limit)};
+    }
+
     /// The design's objects in file order, kept for object properties.
     struct DesignLists {
         const HX_DESIGN* design;
@@ -586,7 +604,8 @@ class HX_FILE_IO::Encoder {
     }
 
     void block_records(const HX_DESIGN& design, AddressIndex& index) {
-        out_.u32(static_cast<uint32_t>(design.blocks_.size()));
+        // A block's position keeps the top bit free (kInnerSide).
+        out_.u32(field(design.blocks_.size(), kInnerSide - 1, "blocks"));
         const HX_BLOCK* last_parent = nullptr;  // siblings mostly follow each other
         uint32_t parent = 0;
         for (std::size_t i = 0; i < design.blocks_.size(); ++i) {
@@ -644,7 +663,7 @@ class HX_FILE_IO::Encoder {
     void signal_records(const HX_DESIGN& design, const AddressIndex& blocks) {
         number_networks(design);
         const BigVector<const HX_SIGNAL*>& signals = list_signals(design);
-        out_.u32(static_cast<uint32_t>(signals.size()));
+        out_.u32(field(signals.size(), kAbsent - 1, "signals"));
         ConnBatch batch;
         for (std::size_t first = 0; first < signals.size(); first += ConnBatch::kSignals) {
             const std::size_t n = std::min(ConnBatch::kSignals, signals.size() - first);
@@ -660,7 +679,7 @@ class HX_FILE_IO::Encoder {
         out_.u32(owner);
         out_.u8(note_props(signal));
         out_.text(signal.name_);
-        out_.u32(static_cast<uint32_t>(batch.end(i) - batch.begin(i)));
+        out_.u32(field(batch.end(i) - batch.begin(i), kAbsent, "connections on a signal"));
         for (std::size_t j = batch.begin(i); j < batch.end(i); ++j) {
             out_.u32(batch.where(j));
             out_.u16(batch.pin(j));
@@ -719,7 +738,7 @@ class HX_FILE_IO::Encoder {
     void connections(const HX_CONN* last, const AddressIndex& blocks, bool skip_first) {
         char* at = out_.mark();
         out_.u32(0);
-        uint32_t count = 0;
+        std::size_t count = 0;
         if (last != nullptr) {
             const HX_CONN* conn = last;
             do {
@@ -730,12 +749,12 @@ class HX_FILE_IO::Encoder {
                 ++count;
             } while (conn != last);
         }
-        Output::patch_u32(at, count);
+        Output::patch_u32(at, field(count, kAbsent, "connections on a map signal"));
     }
 
     void network_records() {
         const auto& nets = lists_.back().networks;
-        out_.u32(static_cast<uint32_t>(nets.size()));
+        out_.u32(field(nets.size(), kAbsent - 1, "networks"));
         for (std::size_t k = 0; k < nets.size(); ++k) {
             if (k + 16 < nets.size()) __builtin_prefetch(nets[k + 16]);
             out_.u32(nets[k]->tag_);
@@ -745,7 +764,7 @@ class HX_FILE_IO::Encoder {
     }
 
     void map_records(const HX_DESIGN& design, const AddressIndex& blocks) {
-        out_.u32(static_cast<uint32_t>(design.mapsignals_.size()));
+        out_.u32(field(design.mapsignals_.size(), kAbsent - 1, "map signals"));
         for (const HX_MAPSIGNAL* map : design.mapsignals_) {
             out_.u32(blocks.find(map->block_));
             out_.u16(map->pin_);
@@ -764,7 +783,7 @@ class HX_FILE_IO::Encoder {
             auto it = design.log_children_.find(design.blocks_[b]);
             if (it == design.log_children_.end() || it->second.empty()) continue;
             out_.u32(static_cast<uint32_t>(b));
-            out_.u32(static_cast<uint32_t>(it->second.size()));
+            out_.u32(field(it->second.size(), kAbsent, "logical blocks in a physical block"));
             for (const HX_BLOCK* child : it->second)
                 out_.u32(blocks.find(child));
             ++count;
@@ -777,7 +796,7 @@ class HX_FILE_IO::Encoder {
         for (std::size_t i = 0; i < designs_.size(); ++i) {
             index.emplace(designs_[i], static_cast<uint32_t>(i));
         }
-        out_.u32(static_cast<uint32_t>(library.aliases().size()));
+        out_.u32(field(library.aliases().size(), kAbsent, "aliases"));
         for (const auto& [alias, design] : library.aliases()) {
             out_.text(alias.c_str());
             out_.u32(index.at(design));
@@ -787,7 +806,7 @@ class HX_FILE_IO::Encoder {
     void property_section() {
         for (std::size_t k = 0; k < with_props_.size(); ++k) {
             const HX_PROPLIST* list = with_props_[k]->get_props();
-            out_.u32(static_cast<uint32_t>(list->count()));
+            out_.u32(field(list->count(), kAbsent, "properties on an object"));
             for (const HX_PROPERTY* prop : list->items()) {
                 if (prop != nullptr) property(*prop, props_design_[k]);
             }
@@ -1681,17 +1700,15 @@ std::unique_ptr<HX_LIBRARY> HX_FILE_IO::read(UT_PTRFILE* file, HX_FILE_TYPE expe
     if (!readable(file)) {
         reason = "not open for reading";
     } else {
+        // Running out of memory is not the file's fault: std::bad_alloc goes
+        // on to the caller, as everywhere in the database.
         BigBytes buffer;
         const uint8_t* data = nullptr;
         std::size_t size = 0;
-        try {
-            if (read_all(file, buffer, data, size)) {
-                library = decode(data, size, expected, reason);
-            } else {
-                reason = "could not be read completely";
-            }
-        } catch (const std::bad_alloc&) {
-            reason = "too large to load";
+        if (read_all(file, buffer, data, size)) {
+            library = decode(data, size, expected, reason);
+        } else {
+            reason = "could not be read completely";
         }
     }
     if (library == nullptr && !quiet) {
@@ -1705,15 +1722,31 @@ std::unique_ptr<HX_LIBRARY> HX_FILE_IO::read(UT_PTRFILE* file, HX_FILE_TYPE expe
 bool HX_FILE_IO::write(UT_PTRFILE* file, const HX_DESIGN& design) {
     if (!writable(file)) return false;
     Encoder encoder;
-    encoder.design_file(design);
+    try {
+        encoder.design_file(design);
+    } catch (const TooLarge& refusal) {
+        return refuse(file, refusal.what);
+    }
     return write(file, encoder);
 }
 
 bool HX_FILE_IO::write(UT_PTRFILE* file, const HX_LIBRARY& library) {
     if (!writable(file)) return false;
     Encoder encoder;
-    encoder.library_file(library);
+    try {
+        encoder.library_file(library);
+    } catch (const TooLarge& refusal) {
+        return refuse(file, refusal.what);
+    }
     return write(file, encoder);
+}
+
+// Nothing of the file is written: its close leaves the destination as it was.
+bool HX_FILE_IO::refuse(UT_PTRFILE* file, const std::string& why) {
+    PORT_MSG("HX", kRevision)
+        .issueError("cannot write database file '%s': %s\n", file->name(), why.c_str());
+    file->fail();
+    return false;
 }
 
 bool HX_FILE_IO::writable(const UT_PTRFILE* file) {

@@ -124,4 +124,5 @@ class HX_FILE_IO {
 
     static bool writable(const UT_PTRFILE* file);
     static bool write(UT_PTRFILE* file, Encoder& encoder);
+    static bool refuse(UT_PTRFILE* file, const std::string& why);
 };

@@ -2,6 +2,7 @@
 #include <algorithm>
 #include <cstdint>
 #include <cstring>
+#include <memory>
 #include <unordered_map>
 #include <unordered_set>
 #include <vector>
@@ -126,13 +127,27 @@ void HX_GRAFT::run(const HX_BLOCK* source_root, HX_BLOCK* instance, bool copy_ma
     if (copy_maps) this->copy_maps();
 }
 
+// Copies depth first, each block before the blocks below it, as the source
+// was made. The walk keeps its own stack: a hierarchy may be far deeper
+// than the call stack would allow.
 void HX_GRAFT::copy_children(const HX_BLOCK* from, HX_BLOCK* to) {
-    auto* iter = from->create_child_iter();
-    while (const HX_BLOCK* child = iter->l_next()) {
-        HX_BLOCK* copy = copy_block(child, to);
-        if (copy != nullptr) copy_children(child, copy);
+    struct Level {
+        HX_BLOCK* copy;
+        std::unique_ptr<UT_BLIST_ITER<HX_BLOCK>> children;
+    };
+    std::vector<Level> stack;
+    stack.push_back({to, std::unique_ptr<UT_BLIST_ITER<HX_BLOCK>>(from->create_child_iter())});
+    while (!stack.empty()) {
+        const HX_BLOCK* child = stack.back().children->l_next();
+        if (child == nullptr) {
+            stack.pop_back();
+            continue;
+        }
+        HX_BLOCK* copy = copy_block(child, stack.back().copy);
+        if (copy != nullptr && child->child_count() != 0)
+            stack.push_back(
+                {copy, std::unique_ptr<UT_BLIST_ITER<HX_BLOCK>>(child->create_child_iter())});
     }
-    from->delete_child_iter(iter);
 }
 
 // The copy shares the source's names (see HX_DESIGN::share_text_of).

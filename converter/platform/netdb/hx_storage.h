@@ -12,10 +12,12 @@
 #include <utility>
 #include <vector>
 
+#include "ut_lazy_map.h"
+
 class HX_BLOCK;
 class HX_NETWORK;
 
-/// Bump allocator over chunks that grow from 4 KiB to 4 MiB. Nothing is
+/// Bump allocator over chunks that grow from 64 bytes to 4 MiB. Nothing is
 /// freed before the arena itself; the owner runs destructors. Page faults
 /// are dear: chunks of 64 KiB and more are mapped and their pages faulted in
 /// a window at a time, and once the arena holds 2 MiB its chunks go on huge
@@ -33,18 +35,22 @@ class HX_ARENA {
 
   private:
     struct Chunk {
-        std::byte* start;
+        Chunk* prev;
         std::size_t size;
         bool mapped;  // else from malloc
     };
     void make_room(std::size_t size, std::size_t align);
     void grow(std::size_t at_least);
 
-    std::vector<Chunk> chunks_;
+    // Small first: a library may hold hundreds of thousands of designs of a
+    // block or two, and each design has two arenas.
+    static constexpr std::size_t kFirstChunk = 64;
+
+    Chunk* last_ = nullptr;  // the chunks, newest first, each at its own start
     std::byte* cur_ = nullptr;
     std::size_t left_ = 0;  // up to the end of what is faulted in
     std::byte* chunk_end_ = nullptr;
-    std::size_t next_chunk_ = 4096;
+    std::size_t next_chunk_ = kFirstChunk;
     std::size_t reserved_ = 0;
 };
 
@@ -207,11 +213,11 @@ struct HX_DESIGN_STORAGE {
     std::shared_ptr<HX_ARENA> text = std::make_shared<HX_ARENA>();
     std::vector<std::shared_ptr<HX_ARENA>> shared_text;
     HX_TAG_TABLE<> tags;
-    std::unordered_map<const HX_BLOCK*, HX_PIN_NAME_INDEX> pin_names;
+    UT_LAZY_MAP<const HX_BLOCK*, HX_PIN_NAME_INDEX> pin_names;
     void* spare_networks = nullptr;  // dropped networks' memory, chained through it
     // Each join's dropped tag and the tag that took it over, in join order,
     // and an index of the first `joined_indexed` of them, made when asked.
     std::vector<std::pair<uint32_t, uint32_t>> joined_tags;
-    std::unordered_map<uint32_t, uint32_t> joined_index;
+    UT_LAZY_MAP<uint32_t, uint32_t> joined_index;
     std::size_t joined_indexed = 0;
 };
