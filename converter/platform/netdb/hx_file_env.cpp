@@ -1,11 +1,9 @@
 // The environment's file operations: database files read whole, and written.
 #include "hx_file.h"
 
-#include <algorithm>
 #include <cstring>
-#include <mutex>
+#include <memory>
 #include <string>
-#include <vector>
 
 #include "hx_design.h"
 #include "hx_file_internal.h"
@@ -20,45 +18,16 @@ using namespace hx_file_internal;
 
 // --- files -----------------------------------------------------------------------
 //
-// get_file_type reads the magic, and the file object cannot seek back. The
-// bytes it took are kept, per file object, for the read that follows; the
-// read tells from the number of bytes left whether they were taken.
+// A file is read once, whole, into memory. get_file_type only looks at its
+// first bytes, which the file object keeps for the read that follows.
 
 namespace {
-
-struct TakenBytes {
-    const UT_PTRFILE* file = nullptr;
-    uint8_t bytes[kMagicSize] = {};
-    std::size_t count = 0;
-};
-
-constexpr std::size_t kMaxTaken = 16;
-std::mutex taken_mutex;
-std::vector<TakenBytes> taken_list;
-
-void remember_taken(const TakenBytes& taken) {
-    std::lock_guard<std::mutex> lock(taken_mutex);
-    std::erase_if(taken_list, [&](const TakenBytes& t) { return t.file == taken.file; });
-    if (taken_list.size() == kMaxTaken) taken_list.erase(taken_list.begin());
-    taken_list.push_back(taken);
-}
-
-TakenBytes recall_taken(const UT_PTRFILE* file) {
-    std::lock_guard<std::mutex> lock(taken_mutex);
-    auto it = std::find_if(taken_list.begin(), taken_list.end(),
-                           [&](const TakenBytes& t) { return t.file == file; });
-    if (it == taken_list.end()) return {};
-    TakenBytes taken = *it;
-    taken_list.erase(it);
-    return taken;
-}
 
 bool readable(const UT_PTRFILE* file) {
     return file != nullptr && file->is_open() && file->access() == Port::ACCESS_READ;
 }
 
-/// The whole file, whether or not get_file_type took its first bytes.
-/// Bytes from big_alloc.
+/// The whole file, in bytes from big_alloc.
 class BigBytes {
   public:
     BigBytes() = default;
@@ -81,30 +50,18 @@ class BigBytes {
 };
 
 bool read_all(UT_PTRFILE* file, BigBytes& buffer, const uint8_t*& data, std::size_t& size) {
-    const TakenBytes taken = recall_taken(file);
     size = static_cast<std::size_t>(file->size());
-    buffer.reset(size + kMagicSize);
-    uint8_t* rest = buffer.get() + taken.count;
-    const std::size_t got = file->read(rest, size);
-    if (got == size) {
-        data = rest;
-        return true;
-    }
-    if (got + taken.count != size) return false;
-    std::memcpy(buffer.get(), taken.bytes, taken.count);
+    buffer.reset(size);
     data = buffer.get();
-    return true;
+    return file->read(buffer.get(), size) == size;
 }
 
 }  // namespace
 
 HX_FILE_TYPE HX_FILE_IO::peek_type(UT_PTRFILE* file) {
     if (!readable(file)) return HX_FILE_UNKNOWN;
-    TakenBytes taken;
-    taken.file = file;
-    taken.count = file->read(taken.bytes, kMagicSize);
-    if (taken.count > 0) remember_taken(taken);
-    return kind_of(taken.bytes, taken.count);
+    uint8_t magic[kMagicSize];
+    return kind_of(magic, file->peek(magic, kMagicSize));
 }
 
 std::unique_ptr<HX_LIBRARY> HX_FILE_IO::read(UT_PTRFILE* file, HX_FILE_TYPE expected, bool quiet) {

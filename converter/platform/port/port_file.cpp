@@ -6,6 +6,7 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <climits>
 #include <csignal>
@@ -302,6 +303,29 @@ std::size_t Stream::read(void* bytes, std::size_t count) {
         done += n;
     }
     return done;
+}
+
+std::size_t Stream::peek(void* bytes, std::size_t count) {
+    if (access_ != ACCESS_READ || fd_ < 0) return 0;
+    count = std::min(count, buffer_.size());
+    if (end_ - begin_ < count) fill_ahead(count);
+    const std::size_t n = std::min(count, end_ - begin_);
+    std::memcpy(bytes, buffer_.data() + begin_, n);
+    return n;
+}
+
+// Moves the unread bytes to the front and reads until `count` are there.
+void Stream::fill_ahead(std::size_t count) {
+    std::memmove(buffer_.data(), buffer_.data() + begin_, end_ - begin_);
+    end_ -= begin_;
+    begin_ = 0;
+    while (end_ < count) {
+        const ssize_t n = ::read(fd_, buffer_.data() + end_, buffer_.size() - end_);
+        if (n < 0 && errno == EINTR) continue;
+        if (n < 0) error_ = errno;
+        if (n <= 0) return;
+        end_ += static_cast<std::size_t>(n);
+    }
 }
 
 bool Stream::close_file() {

@@ -46,6 +46,9 @@ class Stream {
     bool writeline(const char* text);
     /// Reads up to count bytes; fewer only at the end of the file or on an error.
     std::size_t read(void* bytes, std::size_t count);
+    /// Copies up to count bytes (at most the buffer's size) that the next read
+    /// will return, without consuming them; fewer only at the end or on an error.
+    std::size_t peek(void* bytes, std::size_t count);
     /// Hands buffered bytes to the system. False once any write has failed.
     bool flush();
 
@@ -95,6 +98,7 @@ class Stream {
     bool open_path(const char* name);
     bool close_file();
     bool fill();
+    void fill_ahead(std::size_t count);
 
     int access_;
     int fd_ = -1;

@@ -116,6 +116,14 @@ std::size_t UT_PTRFILE::read(void* data, std::size_t count) {
     return n;
 }
 
+std::size_t UT_PTRFILE::peek(void* data, std::size_t count) {
+    if (!open_) return 0;
+    if (!spool_used_) return stream_.peek(data, count);
+    const std::size_t n = std::min(count, spool_.size() - spool_read_);
+    std::memcpy(data, spool_.data() + spool_read_, n);
+    return n;
+}
+
 bool UT_PTRFILE::write(const void* data, std::size_t count) {
     if (!open_ || access_ != Port::ACCESS_WRITE) {
         failed_ = true;

@@ -29,6 +29,9 @@ class UT_PTRFILE {
 
     /// Read access: up to count bytes; fewer only at the end or on an error.
     std::size_t read(void* data, std::size_t count);
+    /// Read access: up to count bytes (64 KB at most) that the next read will
+    /// return, leaving them unread; fewer only at the end or on an error.
+    std::size_t peek(void* data, std::size_t count);
     /// Read access: the file's size when opened. Write access: bytes written so far.
     std::uint64_t size() const { return size_; }
 
