@@ -110,8 +110,7 @@ bool UT_PTRFILE::close() {
 std::size_t UT_PTRFILE::read(void* data, std::size_t count) {
     if (!open_) return 0;
     if (!spool_used_) return stream_.read(data, count);
-    const std::size_t n = std::min(count, spool_.size() - spool_read_);
-    std::memcpy(data, spool_.data() + spool_read_, n);
+    const std::size_t n = peek(data, count);
     spool_read_ += n;
     return n;
 }
